@@ -1,0 +1,99 @@
+// The line classifier. No grammar: a table of statement words decides most lines, a few token
+// rules decide the rest.
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include "analysis/classifier.h"
+
+#include "analysis/token_text.h"
+#include "module/line_types.h"
+#include "tokenizer/operator_table.h"
+#include "tokenizer/token_ids.h"
+#include "tokenizer/token_start.h"
+
+namespace {
+
+struct StatementWord {
+  const char* fWord;
+  LineType fType;
+};
+
+// Searched from the first row; the first row whose word the key token is exactly decides.
+constexpr StatementWord kStatementKeywordTable[] = {
+    {"class", kClassDef},     {"def", kFunctionDef},    {"if", kIfBeginning},
+    {"else", kElseBeginning}, {"while", kWhileBeginning}, {"for", kForBeginning},
+    {"pass", kPass},          {"raise", kRaise},        {"break", kBreak},
+    {"try", kTry},            {"except", kExcept},      {"finally", kFinally},
+    {"return", kReturn},      {"import", kImport},      {"assert", kAssert},
+    {"from", kFromImport},    {"print", kPrint},        {"del", kDelete},
+    {"elif", kElifBeginning}, {"continue", kContinue},  {"with", kWith},
+    {nullptr, kUnknown},
+};
+static_assert(sizeof(kStatementKeywordTable) / sizeof(kStatementKeywordTable[0]) == 22,
+              "21 statement words and the closing row");
+
+const StatementWord* FindStatementWord(const TokenText& text) {
+  for (const StatementWord* row = kStatementKeywordTable; row->fWord; row++) {
+    if (text.Is(row->fWord)) return row;
+  }
+  return nullptr;
+}
+
+bool IsSkippedLeader(const TokenText& text) { return text.Is("\\") || text.Is("async"); }
+
+// Finds the defined name after the key token of a class or function definition.
+uint8_t ScanDefinedName(PyObject* const* tokens, int key, int count, LineType type,
+                        PyObject** localScopeName) {
+  for (int i = key + 1; i < count; i++) {
+    const TokenText text(tokens[i]);
+    const int id = TokenIdForStart(&kOperatorTable, text.fBytes, text.fBytes + text.fLength);
+    if (id == NAME_TOKEN && !text.Is("async")) {
+      Py_CLEAR(*localScopeName);
+      *localScopeName = PyUnicode_DecodeUTF8(text.fBytes, text.fLength, "replace");
+      return *localScopeName ? static_cast<uint8_t>(type) : kClassifyFailed;
+    }
+    const unsigned first = text.At(0);
+    if (first == '(' || first == ')' || first == ':') return kUnknown;
+  }
+  return kUnknown;
+}
+
+bool IsStringLiteral(const TokenText& text) {
+  const unsigned first = text.At(0);
+  if (first == '"' || first == '\'') return true;
+  const unsigned second = text.At(1);
+  return (first == 'R' || first == 'U' || first == 'r' || first == 'u') &&
+         (second == '"' || second == '\'');
+}
+
+// Assignments at bracket depth 0, and lines made only of string literals.
+uint8_t ScanAssignmentOrStrings(PyObject* const* tokens, int count) {
+  int depth = 0;
+  bool allStrings = true;
+  for (int i = 0; i < count; i++) {
+    const TokenText text(tokens[i]);
+    if (text.Is("=") && depth == 0) return kAssignment;
+    if (text.Is("\\") || IsStringLiteral(text)) continue;
+    const unsigned first = text.At(0);
+    if (first == '(' || first == '[' || first == '{') depth++;
+    if (first == ')' || first == ']' || first == '}') depth--;
+    allStrings = false;
+  }
+  return allStrings ? kStringExpression : kUnknown;
+}
+
+}  // namespace
+
+uint8_t ClassifyLogicalLine(PyObject* const* tokens, int count, PyObject** localScopeName) {
+  if (count < 1) return kBlankLine;
+  int key = 0;
+  while (key < count && IsSkippedLeader(TokenText(tokens[key]))) key++;
+  if (key == count) return kBlankLine;
+  const TokenText keyText(tokens[key]);
+  if (const StatementWord* row = FindStatementWord(keyText)) {
+    if (row->fType != kClassDef && row->fType != kFunctionDef) return row->fType;
+    return ScanDefinedName(tokens, key, count, row->fType, localScopeName);
+  }
+  if (count == 1 && keyText.At(0) == '#') return kComment;
+  return ScanAssignmentOrStrings(tokens, count);
+}

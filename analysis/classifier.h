@@ -1,0 +1,13 @@
+// The line classifier: the line type of a logical line from its token texts alone, and the
+// name that a class or function definition defines.
+#pragma once
+
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include <cstdint>
+
+// Returns the line type of the tokens. On a class or function definition with a name, stores
+// the name (a new str) in *localScopeName, releasing what was there. Returns 255 with an
+// exception set when the name cannot be made; the slot is then null.
+uint8_t ClassifyLogicalLine(PyObject* const* tokens, int count, PyObject** localScopeName);

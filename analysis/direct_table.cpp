@@ -1,0 +1,99 @@
+// The direct function table. A positional array: its order is the interface. Entries keep
+// their real signatures and are cast only where they enter the array.
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include "analysis/direct_table.h"
+
+#include "analysis/editing.h"
+#include "logicalline_direct.h"
+#include "module/line_types.h"
+#include "module/logical_line.h"
+#include "tokenizer/token_queries.h"
+
+namespace {
+
+LogicalLine* AsLine(PyObject* object) { return reinterpret_cast<LogicalLine*>(object); }
+
+PyObject* CreateEmptyLogical() { return reinterpret_cast<PyObject*>(NewLogicalLine()); }
+
+int IsLogical(PyObject* object) { return Py_TYPE(object) == &LogicalLineType; }
+
+PyObject* GetLogicalTypeObject() {
+  Py_INCREF(&LogicalLineType);
+  return reinterpret_cast<PyObject*>(&LogicalLineType);
+}
+
+PyObject* GetArgName(PyObject* object, int index) {
+  LogicalLine* line = AsLine(object);
+  if (line->fType != kFunctionDef) {
+    PyErr_SetString(PyExc_ValueError, "Tried to get argument name from a non-function def line");
+    return nullptr;
+  }
+  if (index < 0 || index >= line->fNameCount) {
+    PyErr_SetString(PyExc_IndexError, "Invalid arg name index");
+    return nullptr;
+  }
+  return line->fNames[index];
+}
+
+int GetArgNameCount(PyObject* object) {
+  LogicalLine* line = AsLine(object);
+  return line->fType == kFunctionDef ? static_cast<int>(line->fNameCount) : 0;
+}
+
+int AppendTypeEquivDirect(PyObject* line, PyObject* a, PyObject* b) {
+  return AppendTypeEquivChecked(AsLine(line), a, b);
+}
+int AppendArgTypeEquivDirect(PyObject* line, PyObject* a, PyObject* b) {
+  return AppendArgTypeEquivChecked(AsLine(line), a, b);
+}
+int AppendAttribDirect(PyObject* line, PyObject* object) {
+  return AppendAttribChecked(AsLine(line), object);
+}
+int AppendArgNameDirect(PyObject* line, PyObject* object) {
+  return AppendArgNameChecked(AsLine(line), object);
+}
+int AppendBaseClassNameDirect(PyObject* line, PyObject* object) {
+  return AppendBaseClassNameChecked(AsLine(line), object);
+}
+
+PyObject* GetNamesDefinedDirect(PyObject* line) { return NamesDefined(AsLine(line)); }
+
+int ClearAppended(PyObject* line) {
+  ClearNames(AsLine(line));
+  ClearTypeEquivs(AsLine(line));
+  return 0;
+}
+
+// Each row keeps its entry's own signature type from the public header.
+template <typename Signature>
+void* Entry(Signature function) {
+  return reinterpret_cast<void*>(function);
+}
+
+void* const kLogicalLineFunctionTable[] = {
+    Entry<LLCreateEmptyLogical>(CreateEmptyLogical),                 // 0
+    Entry<LLIsLogical>(IsLogical),                                   // 1
+    Entry<LLGetLogicalTypeObject>(GetLogicalTypeObject),             // 2
+    Entry<LLGetArgName>(GetArgName),                                 // 3
+    Entry<LLGetArgNameCount>(GetArgNameCount),                       // 4
+    Entry<LLAppendTypeEquivDirect>(AppendTypeEquivDirect),           // 5
+    Entry<LLAppendArgTypeEquivDirect>(AppendArgTypeEquivDirect),     // 6
+    Entry<LLAppendAttribDirect>(AppendAttribDirect),                 // 7
+    Entry<LLAppendArgNameDirect>(AppendArgNameDirect),               // 8
+    Entry<LLAppendBaseClassNameDirect>(AppendBaseClassNameDirect),   // 9
+    Entry<LLGetNamesDefined>(GetNamesDefinedDirect),                 // 10
+    Entry<LLClearAppended>(ClearAppended),                           // 11
+    Entry<LLGetTokenTypeDirect>(GetTokenTypeDirect),                 // 12
+    Entry<LLGetStringTokenTypeDirect>(GetStringTokenTypeDirect),     // 13
+};
+static_assert(sizeof(kLogicalLineFunctionTable) / sizeof(void*) == LOGICALLINE_TABLE_SIZE,
+              "the table has exactly its 14 entries");
+
+}  // namespace
+
+PyObject* GetDirectLogicalLineFunctionTable(PyObject*, PyObject*) {
+  return PyCapsule_New(const_cast<void**>(kLogicalLineFunctionTable), LOGICALLINE_CAPSULE_NAME,
+                       nullptr);
+}

@@ -1,0 +1,27 @@
+// TextBuffer: a growable NUL-terminated byte string with inline storage for short texts.
+// It holds the logical line's text and the pending physical line.
+#pragma once
+
+#include <cstddef>
+
+constexpr size_t kInlineTextSize = 160;
+
+struct TextBuffer {
+  char fInline[kInlineTextSize];
+  char* fData;       // fInline, or a heap block owned by the buffer
+  size_t fCapacity;  // bytes of storage, terminating NUL included
+  size_t fLength;    // text bytes held; fData[fLength] is always NUL
+};
+
+// Puts the buffer into the fresh state without freeing anything.
+void InitTextBuffer(TextBuffer* buffer);
+
+// Frees the heap block, if any, and puts the buffer into the fresh state.
+void ResetTextBuffer(TextBuffer* buffer);
+
+// Appends n bytes. Returns 0, or -1 when storage cannot be had (no Python exception is set;
+// the buffer is unchanged).
+int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n);
+
+// Cuts the text to `length` bytes.
+void TruncateText(TextBuffer* buffer, size_t length);

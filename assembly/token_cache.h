@@ -1,0 +1,27 @@
+// Token texts shared within one GetLogicalLineList call: the same name, number or operator
+// text read again hands out the same immutable bytes object instead of a new one.
+#pragma once
+
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include "tokenizer/token_ids.h"
+
+constexpr int kTokenCacheSlots = 4096;      // a power of two
+constexpr Py_ssize_t kCachedTextLimit = 40;  // longer texts are rarely repeated
+
+struct TokenCache {
+  PyObject* fSlots[kTokenCacheSlots];  // owned bytes objects, or null
+  PyObject* fById[kTokenIdLimit];      // owned fixed texts of operators and placeholders
+};
+
+void InitTokenCache(TokenCache* cache);
+
+// Releases every object that the cache holds.
+void ClearTokenCache(TokenCache* cache);
+
+// Returns a new reference to a bytes object holding the n bytes at p.
+PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n);
+
+// Returns a new reference to the bytes object of a fixed text that stands for a token id.
+PyObject* CachedFixedText(TokenCache* cache, int id, const char* text);

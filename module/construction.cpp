@@ -1,0 +1,129 @@
+// Construction: fills a LogicalLine record and classifies it, or hands the raw parts to the
+// host's create hook.
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include "module/construction.h"
+
+#include <cstdlib>
+#include <cstring>
+
+#include "analysis/classifier.h"
+#include "module/errors.h"
+#include "module/logical_line.h"
+#include "module/py_ref.h"
+
+namespace {
+
+PyObject* gCreateHook = nullptr;  // owned; null until SetLogicalCreateFunction
+
+bool PartsAreValid(const LineParts& parts) {
+  if (parts.fIndentLevel >= 0 && parts.fFirstLine >= 0 && parts.fLineCount >= 1) return true;
+  RaiseBadInternalCall(kConstructionCheckLine);
+  return false;
+}
+
+PyObject* PositionPair(const TokenPosition* positions, int i) {
+  if (!positions) Py_RETURN_NONE;
+  PyRef row = PyRef::Steal(PyLong_FromLong(positions[i].fLine));
+  if (!row) return nullptr;
+  PyRef column = PyRef::Steal(PyLong_FromLong(positions[i].fColumn));
+  if (!column) return nullptr;
+  return PyTuple_Pack(2, row.Get(), column.Get());
+}
+
+PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
+  PyRef tokens = PyRef::Steal(PyTuple_New(parts.fTokenCount));
+  if (!tokens) return nullptr;
+  PyRef positions = PyRef::Steal(PyTuple_New(parts.fTokenCount));
+  if (!positions) return nullptr;
+  for (int i = 0; i < parts.fTokenCount; i++) {
+    Py_INCREF(parts.fTokens[i]);
+    PyTuple_SET_ITEM(tokens.Get(), i, parts.fTokens[i]);
+    PyObject* pair = PositionPair(parts.fPositions, i);
+    if (!pair) return nullptr;
+    PyTuple_SET_ITEM(positions.Get(), i, pair);
+  }
+  PyRef hookArgs = PyRef::Steal(Py_BuildValue(
+      "iiiOOiiis", parts.fIndentLevel, parts.fFirstLine, parts.fLineCount, tokens.Get(),
+      positions.Get(), parts.fSpacesInIndent, parts.fTabsInIndent, parts.fIncomplete,
+      parts.fLineText));
+  if (!hookArgs) return nullptr;
+  return PyObject_Call(hook, hookArgs.Get(), nullptr);
+}
+
+// Fills the token arrays; returns -1 with MemoryError set.
+int CopyTokens(LogicalLine* line, const LineParts& parts) {
+  const size_t count = static_cast<size_t>(parts.fTokenCount);
+  line->fTokenArray = static_cast<PyObject**>(malloc((count ? count : 1) * sizeof(PyObject*)));
+  if (!line->fTokenArray) {
+    PyErr_NoMemory();
+    return -1;
+  }
+  for (size_t i = 0; i < count; i++) {
+    Py_XINCREF(parts.fTokens[i]);
+    line->fTokenArray[i] = parts.fTokens[i];
+  }
+  line->fTokenCount = parts.fTokenCount;
+  if (!parts.fPositions) return 0;
+  line->fTokenPositions =
+      static_cast<TokenPosition*>(malloc((count ? count : 1) * sizeof(TokenPosition)));
+  if (!line->fTokenPositions) {
+    PyErr_NoMemory();
+    return -1;
+  }
+  if (count) memcpy(line->fTokenPositions, parts.fPositions, count * sizeof(TokenPosition));
+  return 0;
+}
+
+void CopyLineText(LogicalLine* line, const LineParts& parts) {
+  if (!parts.fLineText) return;
+  // Without memory for the copy the line simply carries no text.
+  line->fLineText = static_cast<char*>(malloc(parts.fLineTextLength + 1));
+  if (!line->fLineText) return;
+  memcpy(line->fLineText, parts.fLineText, parts.fLineTextLength);
+  line->fLineText[parts.fLineTextLength] = '\0';
+}
+
+uint8_t FlagIf(int condition, LineFlag flag) { return condition ? flag : 0; }
+
+}  // namespace
+
+PyObject* CreateNativeLogicalLine(const LineParts& parts) {
+  if (!PartsAreValid(parts)) return nullptr;
+  LogicalLine* line = NewLogicalLine();
+  if (!line) return nullptr;
+  PyRef owner = PyRef::Steal(reinterpret_cast<PyObject*>(line));  // releases a half-built line
+  if (CopyTokens(line, parts) != 0) return nullptr;
+  line->fIndentLevel = static_cast<int16_t>(parts.fIndentLevel);
+  line->fFirstLine = parts.fFirstLine;
+  line->fLineCount = static_cast<int16_t>(parts.fLineCount);
+  line->fType = ClassifyLogicalLine(line->fTokenArray, line->fTokenCount, &line->fLocalScopeName);
+  if (PyErr_Occurred()) return nullptr;
+  line->fFlags = FlagIf(parts.fSpacesInIndent, kSpacesInIndentFlag) |
+                 FlagIf(parts.fTabsInIndent, kTabsInIndentFlag) |
+                 FlagIf(parts.fIncomplete, kIncompleteFlag);
+  CopyLineText(line, parts);
+  // fTokens is built at its first read: most hosts never look at every line's tokens.
+  return owner.Release();
+}
+
+PyObject* CreateLogicalLine(const LineParts& parts) {
+  if (!PartsAreValid(parts)) return nullptr;
+  if (gCreateHook) {
+    PyRef hook = PyRef::FromBorrowed(gCreateHook);  // the hook may replace itself while running
+    return CallCreateHook(hook.Get(), parts);
+  }
+  return CreateNativeLogicalLine(parts);
+}
+
+PyObject* SetLogicalCreateFunction(PyObject*, PyObject* args) {
+  PyObject* hook = nullptr;
+  if (!PyArg_ParseTuple(args, "O", &hook)) return nullptr;
+  // Install before releasing the old hook: its release may run code that installs another.
+  Py_INCREF(hook);
+  PyObject* old = gCreateHook;
+  gCreateHook = hook;
+  Py_XDECREF(old);
+  Py_RETURN_NONE;
+}

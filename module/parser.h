@@ -1,0 +1,24 @@
+// The parser object: four options fixed at creation, and the one method GetLogicalLineList.
+#pragma once
+
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include "tokenizer/operator_table.h"
+
+struct LogicalLineParser {
+  PyObject_HEAD
+  int fSkipWhitespaceLines;  // a line of comments only is not returned
+  int fCopyStrings;          // string tokens keep their own text
+  int fRemoveComments;       // comment tokens are not listed
+  const OperatorTable* fOperatorTable;  // always the module's one table
+  int fIncludeLineText;      // lines carry their source text
+};
+
+extern PyTypeObject LogicalLineParserType;
+
+// Module function CreateLogicalLineParser(copy_strings, skip_whitespace_lines,
+// remove_comments, include_line_text).
+PyObject* CreateLogicalLineParser(PyObject* self, PyObject* args, PyObject* kwargs);
+
+extern const char kCreateLogicalLineParserDoc[];
