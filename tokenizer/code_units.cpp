@@ -61,7 +61,7 @@ bool IsIdentifierStart(const char* p, const char* end) {
 
 bool IsIdentifierChar(const char* p, const char* end) {
   const unsigned b = Byte(p);
-  if (b < 0x80) return b == '_' || HasClass(b, kAsciiLetter | kAsciiDigit);
+  if (b < 0x80) return HasClass(b, kNameChar);
   const Py_UCS4 unit = FirstCodeUnit(p, end);
   return Py_UNICODE_ISALPHA(unit) || Py_UNICODE_ISNUMERIC(unit);
 }

@@ -28,6 +28,7 @@ enum CharClass : uint8_t {
   kBlank = 8,       // tab, vertical tab, form feed, space
   kLineBreak = 16,  // LF, CR
   kQuote = 32,      // ' and "
+  kNameChar = 64,   // ASCII letters, digits and '_'
 };
 
 // One row per byte value, built at compile time.
@@ -42,6 +43,7 @@ struct CharClassTable {
       if (b == '\t' || b == '\v' || b == '\f' || b == ' ') c |= kBlank;
       if (b == '\n' || b == '\r') c |= kLineBreak;
       if (b == '\'' || b == '"') c |= kQuote;
+      if ((c & (kAsciiLetter | kAsciiDigit)) || b == '_') c |= kNameChar;
       fRows[b] = c;
     }
   }

@@ -25,7 +25,15 @@ int BackslashRun(const char* from, const char* before) {
 // Steps over a name: its first character, then every character that may continue it.
 const char* ScanName(const char* p, const char* end) {
   p += StepOverChar(p, end);
-  while (p < end && IsIdentifierChar(p, end)) p += StepOverChar(p, end);
+  while (p < end) {
+    if (Byte(p) < 0x80) {  // the common case needs no decoding
+      if (!HasClass(Byte(p), kNameChar)) break;
+      p++;
+    } else {
+      if (!IsIdentifierChar(p, end)) break;
+      p += StepOverChar(p, end);
+    }
+  }
   return p;
 }
 

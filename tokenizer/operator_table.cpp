@@ -34,19 +34,34 @@ static_assert(kByTextCount == 49, "every canonical text plus \"<>\"");
 static_assert(kByIdCount == 48, "one row per operator id");
 static_assert(kByTextCount == kByIdCount + 1, "the tables must list the same operators");
 
+// Where each first byte's group of rows begins, so a lookup skips straight to its group.
+struct GroupIndex {
+  signed char fStart[256];
+  constexpr GroupIndex() : fStart() {
+    for (signed char& start : fStart) start = -1;
+    for (int row = kByTextCount - 1; row >= 0; row--)
+      fStart[static_cast<unsigned char>(kOperatorsByText[row].fSpelling[0])] =
+          static_cast<signed char>(row);
+  }
+};
+
+constexpr GroupIndex kGroupIndex;
+
 }  // namespace
 
-const OperatorTable kOperatorTable = {kOperatorsByText, kByTextCount, kOperatorsById, kByIdCount};
+const OperatorTable kOperatorTable = {kOperatorsByText, kByTextCount, kOperatorsById, kByIdCount,
+                                      kGroupIndex.fStart};
 
 const OperatorEntry* FindOperator(const OperatorTable* table, const char* p, const char* end) {
   if (p >= end) return nullptr;
   const char first = *p;
-  const OperatorEntry* row = table->fByText;
-  const OperatorEntry* last = row + table->fByTextCount;
-  while (row < last && row->fSpelling[0] != first) row++;
+  const int start = table->fGroupStart[static_cast<unsigned char>(first)];
+  if (start < 0) return nullptr;
+  const OperatorEntry* last = table->fByText + table->fByTextCount;
   const OperatorEntry* found = nullptr;
   const size_t available = static_cast<size_t>(end - p);
-  for (; row < last && row->fSpelling[0] == first; row++) {
+  for (const OperatorEntry* row = table->fByText + start; row < last && row->fSpelling[0] == first;
+       row++) {
     const size_t n = strlen(row->fSpelling);
     if (n <= available && memcmp(row->fSpelling, p, n) == 0) found = row;
   }

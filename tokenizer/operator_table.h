@@ -13,6 +13,7 @@ struct OperatorTable {
   int fByTextCount;
   const OperatorEntry* fById;  // increasing id; each text is its id's canonical text
   int fByIdCount;
+  const signed char* fGroupStart;  // by first byte: index of the first fByText row, or -1
 };
 
 // The module's one operator table.
