@@ -51,8 +51,9 @@ int ReadLines(LogicalLineParser* parser, PyObject* readline, int firstLine, int 
     return -1;
   }
   InitTokenCache(reading.fCache);
-  const bool hasStop = lineCount != -1;
-  const int64_t stop = static_cast<int64_t>(firstLine) + lineCount;
+  // Counted in 64 bits, so that no sum of the two arguments wraps; -1 means no stop line.
+  const int64_t stop = lineCount == -1 ? -1 : static_cast<int64_t>(firstLine) + lineCount;
+  const bool hasStop = stop != -1;
   reading.fLineNumber = firstLine;
   while (!(hasStop && reading.fLineNumber >= stop) && !reading.fAtEnd) {
     PyRef line = PyRef::Steal(BuildLogicalLine(parser, readline, &reading.fPending,
