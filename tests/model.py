@@ -1,0 +1,370 @@
+"""Pure-Python model of the logical line reader, to cross-check the native module with.
+
+It walks the same bytes the same way: character classes, token starts, the line scanner, the
+token list, the logical line builder, the reading loop and the classifier. Clarity comes
+first; regular expressions only speed up plain ASCII runs.
+"""
+import bisect
+import re
+from types import SimpleNamespace
+
+NAME, NUMBER, STRING, NEWLINE, ERROR, COMMENT = 1, 2, 3, 4, 201, 202
+LINE_TYPE_NAMES = (
+    "kUnknown", "kClassDef", "kFunctionDef", "kStringExpression", "kAssignment",
+    "kIfBeginning", "kElseBeginning", "kWhileBeginning", "kForBeginning", "kPass", "kRaise",
+    "kTry", "kExcept", "kFinally", "kAssert", "kReturn", "kImport", "kFromImport", "kPrint",
+    "kDelete", "kElifBeginning", "kComment", "kBlankLine", "kBreak", "kContinue", "kWith")
+UNKNOWN, CLASS_DEF, FUNCTION_DEF, STRING_EXPRESSION, ASSIGNMENT, COMMENT_LINE, BLANK_LINE = (
+    0, 1, 2, 3, 4, 21, 22)
+
+# Operator ids follow this order from 7; "<>" is a second spelling of "!=".
+OPERATORS = dict(zip(b"( ) [ ] : , ; + - * / | & < > = . % ` { } == != <= >= ~ ^ << >> ** += "
+                     b"-= *= /= %= &= |= ^= <<= >>= **= // //= @ -> ... :=".split(), range(7, 54)))
+OPERATORS.update({b"<>": 29, b"\\": 203})
+CANONICAL = {ident: text for text, ident in OPERATORS.items() if text != b"<>"}
+ERROR_PREFIX, STRING_PLACEHOLDER, QUOTES = b"<errortoken> ", b"'<string>'", b"'\""
+HEX_DIGITS = b"0123456789abcdefABCDEF"
+BLANKS, ASCII_NAME_CHARS = re.compile(rb"[\t\x0b\x0c ]*"), re.compile(rb"[A-Za-z0-9_]*")
+
+# Words that begin a new statement even on a line that continues an open one.
+STATEMENT_KEYWORDS = set(b"assert break class continue def del elif except exec finally from "
+                         b"global import pass raise return try while".split())
+# The first word of a line and the line type it decides.
+LINE_KEYWORDS = dict(zip(b"class def if else while for pass raise break try except finally "
+                         b"return import assert from print del elif continue with".split(),
+                         (1, 2, 5, 6, 7, 8, 9, 10, 23, 11, 12, 13, 15, 16, 14, 17, 18, 19, 20,
+                          24, 25)))
+
+
+def first_code_unit(b, p, end):
+    """Low 16 bits of the first character's code point; 0 when it cannot be decoded."""
+    b0 = b[p] if p < end else 0
+    if b0 < 0x80:
+        return b0
+    n = 0 if b0 < 0xC0 or b0 >= 0xF8 else 2 if b0 < 0xE0 else 3 if b0 < 0xF0 else 4
+    tail = b[p + 1:p + n]
+    if n == 0 or end - p < n or any(c & 0xC0 != 0x80 for c in tail):
+        return 0
+    unit = b0 & (0x1F, 0x0F, 0)[n - 2]  # a 4-byte lead's bits fall out of the 16-bit unit
+    for c in tail:
+        unit = unit << 6 | c & 0x3F
+    return unit & 0xFFFF
+
+
+def step_char(b, p, end):
+    """Position after the character at p. A malformed sequence stops at the first byte that
+    is no continuation byte, so a stray lead byte never swallows the ASCII byte after it."""
+    b0 = b[p]
+    stop = min(end, p + (1 if b0 < 0x80 else 2 if b0 < 0xE0 else 3 if b0 < 0xF0 else
+                         4 if b0 < 0xF8 else 3))
+    p += 1
+    while p < stop and b[p] & 0xC0 == 0x80:
+        p += 1
+    return p
+
+
+def is_name_char(b, p, end, first=False):
+    c = b[p]
+    if c < 0x80:
+        return c == 0x5F or chr(c).isalpha() or (not first and chr(c).isdigit())
+    unit = chr(first_code_unit(b, p, end))
+    return unit.isalpha() or (not first and unit.isnumeric())
+
+
+def find_operator(b, p, end):
+    """The longest operator text at p that lies wholly before end, or None."""
+    return next((b[p:p + n] for n in (3, 2, 1) if p + n <= end and b[p:p + n] in OPERATORS),
+                None)
+
+
+def string_start(b, p, end):
+    """(position after the opening quotes, quote, triple), or None if no string starts at p."""
+    l1, l2, l3 = (b[i] | 0x20 if i < end and 0x41 <= b[i] <= 0x5A else b[i] if i < end else 0
+                  for i in (p, p + 1, p + 2))
+    if l1 in b"rbuf" and l2 in QUOTES:
+        p += 1
+    elif l3 in QUOTES and bytes((l1, l2)) in (b"rb", b"ru", b"rf", b"br", b"ur", b"fr"):
+        p += 2
+    if p >= end or b[p] not in QUOTES:
+        return None
+    q = b[p]
+    triple = p + 2 < end and b[p + 1] == q == b[p + 2]
+    return p + (3 if triple else 1), q, triple
+
+
+def token_id_for_start(b, p=0, end=None):
+    end = len(b) if end is None else end
+    if string_start(b, p, end):
+        return STRING
+    if p >= end:
+        return ERROR
+    c = b[p]
+    if is_name_char(b, p, end, first=True):
+        return NAME
+    if c in b"\r\n":
+        return NEWLINE
+    if 0x30 <= c <= 0x39 or (c == 0x2E and p + 1 < end and 0x30 <= b[p + 1] <= 0x39):
+        return NUMBER
+    if c == 0x23:
+        return COMMENT
+    op = find_operator(b, p, end)
+    return OPERATORS[op] if op else ERROR
+
+
+def escaped(b, k, stop):
+    """True when an odd run of backslashes ends just before k, not looking back past stop."""
+    n = 0
+    while k - 1 - n >= stop and b[k - 1 - n] == 0x5C:
+        n += 1
+    return n % 2 == 1
+
+
+def scan_string_body(b, st, frm, end):
+    q, p = st.quote, b.find(st.quote, frm, end)
+    while p >= 0:
+        k = p - 2 if st.triple else p
+        if k >= frm and b[k] == q == b[k + st.triple] and not escaped(b, k, frm):
+            st.complete = 1
+            return p + 1
+        p = b.find(q, p + 1, end)
+    if st.triple or end <= frm or b[end - 1] not in b"\r\n":
+        st.complete = 0
+        return end
+    term = end - 2 if end - 2 >= frm and b[end - 2:end] == b"\r\n" else end - 1
+    if escaped(b, term, frm):
+        st.complete = 0                 # backslash-newline: the string runs on
+        return end
+    st.tok, st.complete = ERROR, 1      # unterminated; its terminator follows as a newline
+    return term
+
+
+def scan_number(b, p, end):
+    p += 1
+    while p < end and (b[p] in b".0123456789ABCDEFabcdefJjLlOoXx"
+                       or (b[p] in b"+-" and b[p - 1] in b"Ee")
+                       or (b[p] == 0x5F and p + 1 < end and b[p - 1] in HEX_DIGITS + b"OoXx"
+                           and b[p + 1] in HEX_DIGITS)):
+        p += 1
+    return p
+
+
+def scan_next_token(b, st, pos, end):
+    """Scans the next token of the physical line ending at end into st; returns the position
+    after it, or None when the line holds no further token."""
+    if pos >= end:
+        return None
+    if st.tok == STRING and not st.complete:   # the line begins inside an open string
+        pos = scan_string_body(b, st, pos, end)
+    else:
+        pos = BLANKS.match(b, pos, end).end()
+        if pos >= end:
+            return None
+        st.tok, st.start, st.complete = token_id_for_start(b, pos, end), pos, 1
+        if st.tok == NAME:
+            pos = step_char(b, pos, end)
+            while pos < end:
+                pos = ASCII_NAME_CHARS.match(b, pos, end).end()
+                if pos >= end or b[pos] < 0x80 or not is_name_char(b, pos, end):
+                    break
+                pos = step_char(b, pos, end)
+        elif st.tok == NUMBER:
+            pos = scan_number(b, pos, end)
+        elif st.tok == STRING:
+            pos, st.quote, st.triple = string_start(b, pos, end)
+            pos = scan_string_body(b, st, pos, end)
+        elif st.tok == NEWLINE:
+            pos += 2 if b[pos:min(pos + 2, end)] == b"\r\n" else 1
+        elif st.tok == ERROR:
+            pos = step_char(b, pos, end)
+        elif st.tok == COMMENT:
+            pos = end
+        else:
+            pos += len(find_operator(b, pos, end))
+    pos = min(pos, end)
+    if st.complete or pos == end:
+        st.end = pos
+    return pos
+
+
+def nesting_delta(text):
+    return (text[:1] in (b"(", b"[", b"{")) - (text[:1] in (b")", b"]", b"}"))
+
+
+class Builder:
+    """Working state of one logical line: its text, scanner state and token list."""
+
+    def __init__(self, copy_strings, remove_comments):
+        self.copy_strings, self.remove_comments = copy_strings, remove_comments
+        self.text, self.line_starts = b"", []
+        # Scanner state; complete is 0 while a string runs on to the next physical line.
+        self.scan = SimpleNamespace(tok=0, start=-1, end=-1, complete=0, quote=0, triple=0)
+        self.tokens, self.positions = [], []
+        self.line_index = self.nesting = self.significant = 0
+        self.indent, self.tabs, self.spaces = -1, 0, 0
+
+    def position(self, start):
+        # Placed on the physical line, as read, that holds the token's first byte.
+        i = bisect.bisect_right(self.line_starts, start) - 1
+        return i, start - self.line_starts[i]
+
+    def add_line(self, line, measure=False):
+        line_start = len(self.text)
+        self.line_starts.append(line_start)
+        b = self.text = self.text + line
+        st, pos = self.scan, line_start
+        while (pos := scan_next_token(b, st, pos, len(b))) is not None:
+            if measure and self.indent < 0:  # measured at the first token, even if dropped
+                self.indent = 0
+                for c in b[line_start:st.start]:
+                    if c == 0x09:
+                        self.indent, self.tabs = self.indent + 8 - self.indent % 8, 1
+                    elif c == 0x20:
+                        self.indent, self.spaces = self.indent + 1, 1
+            if not st.complete or st.tok == NEWLINE or (st.tok == COMMENT and self.remove_comments):
+                continue
+            text = b[st.start:st.end]
+            if st.tok == STRING and not self.copy_strings:
+                text = STRING_PLACEHOLDER
+            elif st.tok == ERROR:
+                text = ERROR_PREFIX + text
+            elif st.tok not in (NAME, NUMBER, STRING, COMMENT):
+                text = CANONICAL[st.tok]
+            self.append(text, self.position(st.start))
+
+    def append(self, text, position):
+        self.tokens.append(text)
+        self.positions.append(position)
+        self.significant += text[:1] not in (b"#", b"\n")
+        self.nesting += nesting_delta(text)
+
+    def hand_back(self, k):
+        for text in self.tokens[k:]:
+            self.significant -= text[:1] not in (b"#", b"\n")
+            self.nesting -= nesting_delta(text)
+        del self.tokens[k:], self.positions[k:]
+        self.text = self.text[:self.line_starts.pop()]
+        self.scan.complete = 1  # a string the handed-back line opened is not ours to report
+
+    def trailing_backslash(self):
+        return self.tokens[-1] == b"\\" and self.positions[-1][0] == self.line_index
+
+    def is_open(self):
+        if self.scan.tok == STRING and not self.scan.complete:
+            return True
+        return bool(self.tokens) and (self.trailing_backslash() or self.nesting > 0)
+
+    def starts_new_statement(self, k, depth_before):
+        t, toks = self.tokens[k], self.tokens
+        if t[:1] == b"@":
+            return True
+        if depth_before <= 0 and k > 0 and toks[k - 1] == b"\\":
+            return False
+        if depth_before <= 0 and t == b"for":
+            return True
+        if t == b"if":  # unless a conditional expression or a comprehension goes on
+            return not (len(toks) >= 50 or self.trailing_backslash() or self.nesting > 0
+                        or b"else" in toks[k + 1:] or b"for" in toks[:k])
+        if t == b"else":
+            return k < 50 and (k == 0 or b"if" not in toks[:k])
+        return t in STATEMENT_KEYWORDS
+
+
+class Source:
+    """What readline hands out, plus the one physical line that the builder handed back."""
+
+    def __init__(self, chunks):
+        self.chunks, self.pending, self.at_end = iter(chunks), b"", False
+
+    def read(self, lineno):
+        if self.pending:
+            line, self.pending = self.pending, b""
+            return line
+        line = next(self.chunks, b"")
+        self.at_end = not line
+        if b"\0" in line:
+            raise ValueError(f"Binary data encountered at lineno {lineno} while tokenizing")
+        return line
+
+
+def build_logical_line(src, lineno, copy_strings, skip_whitespace_lines, remove_comments,
+                       include_line_text):
+    """Returns (line dict or None, the number of the next physical line)."""
+    bld, first = Builder(copy_strings, remove_comments), lineno
+    line = src.read(lineno)
+    if line:
+        bld.add_line(line, measure=True)
+    lineno += 1
+    is_open = bld.is_open()
+    while is_open and not src.at_end:
+        depth_before, k = bld.nesting, len(bld.tokens)
+        line = src.read(lineno)
+        if src.at_end:
+            break
+        bld.line_index += 1
+        bld.add_line(line)
+        if len(bld.tokens) > k and bld.starts_new_statement(k, depth_before):
+            bld.hand_back(k)
+            src.pending = line
+            break
+        lineno += 1
+        is_open = bld.is_open()
+    st = bld.scan
+    if st.start != -1 and not st.complete:  # the input ended inside a string
+        end = st.end if st.end > st.start else len(bld.text)
+        bld.append(ERROR_PREFIX + bld.text[st.start:end], bld.position(st.start))
+        is_open = True
+    if not bld.tokens or (skip_whitespace_lines and bld.significant == 0):
+        return None, lineno
+    if first < 0:
+        raise SystemError("bad internal call")
+    if first > 2**31 - 1:  # line numbers are counted wide but stored in 32 bits
+        raise OverflowError("Line number does not fit in 32 bits")
+    line_type, name = classify(bld.tokens)
+    return dict(
+        type=line_type, local_scope_name=name, first_line=first, line_count=lineno - first,
+        indent=bld.indent, tabs=bld.tabs, spaces=bld.spaces, incomplete=int(is_open),
+        tokens=bld.tokens, positions=[(i & 0xFFFF, c & 0xFFFF) for i, c in bld.positions],
+        line_text=bld.text if include_line_text else None), lineno
+
+
+def model_lines(physical_lines, copy_strings=True, skip_whitespace_lines=True,
+                remove_comments=True, include_line_text=True, first_line=0, line_count=-1):
+    """The logical lines of the source that readline hands out as physical_lines."""
+    opts = (copy_strings, skip_whitespace_lines, remove_comments, include_line_text)
+    stop = first_line + line_count  # never wraps: counted wider than the arguments
+    stop = None if line_count == -1 or stop == -1 else stop
+    src, lineno, result = Source(physical_lines), first_line, []
+    while (stop is None or lineno < stop) and not src.at_end:
+        line, lineno = build_logical_line(src, lineno, *map(bool, opts))
+        if line is not None:
+            result.append(line)
+    return result
+
+
+def classify(tokens):
+    """(line type, defined name or None), from the token texts alone."""
+    key = next((i for i, t in enumerate(tokens) if t not in (b"\\", b"async")), None)
+    if key is None:
+        return BLANK_LINE, None
+    line_type = LINE_KEYWORDS.get(tokens[key])
+    if line_type in (CLASS_DEF, FUNCTION_DEF):
+        for t in tokens[key + 1:]:
+            if token_id_for_start(t) == NAME and t != b"async":
+                return line_type, t.decode("utf-8", "replace")
+            if t[:1] in (b"(", b")", b":"):
+                break
+        return UNKNOWN, None
+    if line_type is not None:
+        return line_type, None
+    if len(tokens) == 1 and tokens[0][:1] == b"#":
+        return COMMENT_LINE, None
+    depth, all_strings = 0, True
+    for t in tokens:
+        if t == b"=" and depth == 0:
+            return ASSIGNMENT, None
+        # Only unprefixed and r/u-prefixed literals count as strings here.
+        if t == b"\\" or t[:1] in (b'"', b"'") or (t[:1] in b"RUru" and t[1:2] in (b'"', b"'")):
+            continue
+        depth += nesting_delta(t)
+        all_strings = False
+    return (STRING_EXPRESSION if all_strings else UNKNOWN), None

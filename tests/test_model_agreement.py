@@ -1,0 +1,211 @@
+"""Compares every field of the module's logical lines with the model in tests/model.py, on
+standard library sources and on generated hostile inputs."""
+import io
+import itertools
+import os
+import random
+import subprocess
+import sys
+
+import pytest
+
+import logicalline
+
+sys.path.insert(0, os.path.dirname(os.path.abspath(__file__)))
+import model  # noqa: E402
+
+ALL_OPTIONS = list(itertools.product((True, False), repeat=4))
+DEFAULTS = (True, True, True, True)
+TYPE_INDEX = {getattr(logicalline, name): i for i, name in enumerate(model.LINE_TYPE_NAMES)}
+STDLIB = os.path.dirname(os.__file__)
+
+
+def pytest_generate_tests(metafunc):
+    if "stdlib_case" not in metafunc.fixturenames:
+        return
+    files = []
+    for folder, subfolders, names in os.walk(STDLIB):
+        subfolders[:] = sorted(set(subfolders) - {"site-packages", "dist-packages",
+                                                  "__pycache__"})
+        files += [os.path.join(folder, n) for n in sorted(names) if n.endswith(".py")]
+    if metafunc.config.getoption("--full-stdlib"):
+        cases = [(f, o) for f in files for o in (DEFAULTS, (False, False, False, True))]
+    else:
+        sample = files[::max(1, len(files) // 60)]
+        cases = [(f, o) for f in sample[:3] for o in ALL_OPTIONS]
+        cases += [(f, DEFAULTS) for f in sample[3:]]
+    metafunc.parametrize("stdlib_case", cases, ids=[
+        os.path.relpath(f, STDLIB) + "-" + "".join(str(int(x)) for x in o) for f, o in cases])
+
+
+def text_view(text):
+    try:
+        return text if text is None else text.decode()
+    except UnicodeDecodeError:
+        return "<undecodable>"
+
+
+def outcome(read):
+    """The list of line views that read() gives, or the error it raises."""
+    try:
+        return read()
+    except (ValueError, SystemError, OverflowError) as error:
+        return (type(error).__name__, "" if isinstance(error, SystemError) else str(error))
+
+
+def model_outcome(chunks, opts, first_line=0, line_count=-1):
+    return outcome(lambda: [
+        dict(line, tokens=[t.decode("utf-8", "replace") for t in line["tokens"]],
+             line_text=text_view(line["line_text"]))
+        for line in model.model_lines(chunks, *opts, first_line, line_count)])
+
+
+def module_view(line):
+    try:
+        text = line.fLineText
+    except UnicodeDecodeError:
+        text = "<undecodable>"
+    tokens = [t for t, _ in line.fTokens]
+    assert [line.GetTokenString(i) for i in range(line.fTokenCount)] == tokens
+    return dict(
+        type=TYPE_INDEX[line.fType], local_scope_name=line.fLocalScopeName,
+        first_line=line.fFirstLine, line_count=line.fLineCount, indent=line.fIndentLevel,
+        tabs=int(line.fTabsInIndent), spaces=int(line.fSpacesInIndent),
+        incomplete=int(line.fIncomplete), tokens=tokens, positions=[p for _, p in line.fTokens],
+        line_text=text)
+
+
+def module_outcome(chunks, opts, first_line=0, line_count=-1):
+    parser = logicalline.CreateLogicalLineParser(*opts)
+    # A readline call after the final b"" raises StopIteration, which would show here.
+    readline = iter(chunks + [b""]).__next__
+    return outcome(lambda: [module_view(line) for line in
+                            parser.GetLogicalLineList(readline, first_line, line_count)])
+
+
+def assert_agreement(chunks, opts, first_line=0, line_count=-1):
+    want = model_outcome(chunks, opts, first_line, line_count)
+    got = module_outcome(chunks, opts, first_line, line_count)
+    if got == want:
+        return
+    where = f"{chunks!r}"[:400] + f"\n{opts}, first_line {first_line}, line_count {line_count}"
+    if isinstance(got, tuple) or isinstance(want, tuple):
+        pytest.fail(f"{where}\nmodule: {str(got)[:800]}\nmodel:  {str(want)[:800]}")
+    i = next((i for i, (g, w) in enumerate(zip(got, want)) if g != w), min(len(got), len(want)))
+    g, w = (got[i] if i < len(got) else {}), (want[i] if i < len(want) else {})
+    fields = sorted(k for k in {**g, **w} if g.get(k) != w.get(k))
+    pytest.fail(f"{where}\nlogical line {i} differs in {fields}\nmodule: {g}\nmodel:  {w}")
+
+
+def test_stdlib_source(stdlib_case):
+    path, opts = stdlib_case
+    with open(path, "rb") as f:
+        chunks = list(io.BytesIO(f.read()))  # cut exactly where BytesIO.readline cuts
+    assert_agreement(chunks, opts)
+
+
+# Weighted towards what trips a reader: quotes, escapes, every kind of line break, brackets,
+# words that end a logical line early, and malformed or non-ASCII UTF-8.
+FRAGMENTS = {
+    b"'": 6, b'"': 4, b"'''": 4, b'"""': 3, b"\\": 6, b"\\\\": 2, b"(": 4, b")": 4, b"[": 2,
+    b"]": 2, b"{": 1, b"}": 1, b"\n": 12, b"\r\n": 4, b"\r": 3, b"\t": 3, b" ": 10, b"    ": 4,
+    b"\x0c": 1, b"\x0b": 1, b"def ": 3, b"class ": 2, b"if ": 3, b"else": 3, b"else:": 1,
+    b"for ": 3, b"@": 3, b"async ": 1, b"return ": 1, b"import ": 1, b"print ": 1, b"with ": 1,
+    b"pass": 1, b"x": 6, b"f": 2, b"y1": 2, b"_a": 1, b"=": 4, b" = ": 3, b"==": 1, b"<>": 1,
+    b":": 3, b",": 3, b".": 1, b"...": 1, b"->": 1, b":=": 1, b"**=": 1, b"0x_1F": 1,
+    b"1e-5": 1, b"1__0": 1, b".5": 1, b"5j": 1, b"#c": 3, b"r'": 2, b'rb"': 1, b"bu'": 1,
+    b"U'": 1, b"$": 1, b"?": 1, b"!": 1, b"`": 1, b"\x80": 3, b"\xff": 2, b"\xc3": 2,
+    b"\xc3\xa9": 2, b"\xe2\x82\xac": 1, b"\xf0\x9f\x98\x80": 1, b"\xc2\xb2": 1, b"\xe0\xa5\xa9": 1}
+
+
+def hostile_chunks(seed, nul=False):
+    rng = random.Random(seed)
+    data = b"".join(rng.choices(list(FRAGMENTS), list(FRAGMENTS.values()), k=rng.randint(1, 60)))
+    # Mostly cut after line feeds, as readline does, but also anywhere, so that chunks end
+    # without a terminator or hold several line breaks.
+    cuts = {i + 1 for i, c in enumerate(data) if c == 0x0A and rng.random() < 0.8}
+    cuts |= {rng.randrange(1, len(data) + 1) for _ in range(rng.randint(0, 4))} | {len(data)}
+    bounds = [0] + sorted(cuts)
+    chunks = [data[a:b] for a, b in zip(bounds, bounds[1:])]
+    if nul:
+        i = rng.randrange(len(chunks))
+        at = rng.randrange(len(chunks[i]) + 1)
+        chunks[i] = chunks[i][:at] + b"\0" + chunks[i][at:]
+    return chunks
+
+
+@pytest.mark.parametrize("block", range(20))
+def test_hostile_inputs(block):
+    for seed in range(block * 100, block * 100 + 100):
+        rng = random.Random(-seed)
+        line_range = rng.choice([(0, -1)] * 6 + [(7, -1), (0, 0), (3, 1), (0, 2), (5, 4), (0, -5)])
+        for opts in rng.sample(ALL_OPTIONS, 3):
+            assert_agreement(hostile_chunks(seed), opts, *line_range)
+
+
+@pytest.mark.parametrize("chunks", [
+    [b"f(\x80)\n"],                                  # a stray continuation byte keeps the ")"
+    [b"x = '''abc\n", b"def"],                       # input ends inside a triple-quoted string
+    [b"s = 'a\\\n", b"b\n"],                         # escaped newline, then unterminated
+    [b"  ", b"x = 1\n"],                             # blanks without a line break stand alone
+    [b"a = (1,\n", b"def f(): '''x\n", b"y'''\n"],   # hand-back with a string left open
+    [b"x = \"\"\"a\nb\"\"\" + '", b"c\\\n", b"d'\n"],  # multi-line tokens' positions
+    [b"a = (" + b"1," * 25 + b"\n", b"else 2)\n"],   # "else" after 50 tokens joins
+    [b"a = [" + b"1," * 25 + b"\n", b"if y]\n"],     # so does "if"
+])
+def test_known_hard_inputs(chunks):
+    for opts in ALL_OPTIONS:
+        assert_agreement(chunks, opts)
+
+
+@pytest.mark.parametrize("first_line, line_count", [
+    (-1, -1),        # a line cannot be built with a negative first line
+    (1, -2),         # the stop line works out as -1, which means no stop line
+    (2**31 - 2, 3),  # past the largest line number: refused, never wrapped
+])
+def test_unusual_line_ranges(first_line, line_count):
+    assert_agreement([b"x = (1,\n", b"2)\n", b"y\n"], DEFAULTS, first_line, line_count)
+
+
+@pytest.mark.parametrize("seed", range(40))
+def test_binary_data_is_refused_with_its_line_number(seed):
+    chunks = hostile_chunks(seed, nul=True)
+    assert model_outcome(chunks, DEFAULTS)[0] == "ValueError"
+    assert_agreement(chunks, DEFAULTS)
+    # A line limit that stops reading before the binary line avoids the error.
+    assert_agreement(chunks, DEFAULTS, 0, next(i for i, c in enumerate(chunks) if b"\0" in c))
+
+
+def hook_agreement():
+    """Compares the raw parts that reach a create hook. Runs in a fresh interpreter, because a
+    hook, once set, stays for the life of the process."""
+    logicalline.SetLogicalCreateFunction(lambda *parts: parts)
+    failures = 0
+    options = [(True, False, False, False), (False, True, True, True)]
+    for seed, opts in itertools.product(range(1000), options):
+        chunks = hostile_chunks(seed)
+        lines = model.model_lines(chunks, *opts)
+        want = [(m["indent"], m["first_line"], m["line_count"], tuple(m["tokens"]),
+                 tuple(m["positions"]), m["spaces"], m["tabs"], m["incomplete"],
+                 text_view(m["line_text"])) for m in lines]
+        if "<undecodable>" in [w[8] for w in want]:
+            want = "UnicodeDecodeError"  # the hook is never called with undecodable text
+        try:
+            got = logicalline.CreateLogicalLineParser(*opts).GetLogicalLineList(
+                iter(chunks + [b""]).__next__)
+        except UnicodeDecodeError:
+            got = "UnicodeDecodeError"
+        if got != want:
+            failures += 1
+            print(f"seed {seed}, options {opts}: {chunks!r}\nmodule: {got!r}\nmodel:  {want!r}")
+    return failures
+
+
+def test_create_hook_receives_raw_parts():
+    env = dict(os.environ, PYTHONPATH=os.pathsep.join(
+        [os.path.dirname(logicalline.__file__), os.environ.get("PYTHONPATH", "")]))
+    code = (f"import sys; sys.path.insert(0, {os.path.dirname(os.path.abspath(__file__))!r}); "
+            "import test_model_agreement as t; sys.exit(min(t.hook_agreement(), 100))")
+    run = subprocess.run([sys.executable, "-c", code], env=env, capture_output=True,
+                         text=True, errors="replace", timeout=300)
+    assert run.returncode == 0, run.stdout[-4000:] + run.stderr[-4000:]
