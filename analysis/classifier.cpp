@@ -5,6 +5,8 @@
 
 #include "analysis/classifier.h"
 
+#include <string_view>
+
 #include "analysis/token_text.h"
 #include "module/line_types.h"
 #include "tokenizer/operator_table.h"
@@ -14,7 +16,7 @@
 namespace {
 
 struct StatementWord {
-  const char* fWord;
+  std::string_view fWord;  // empty in the closing row
   LineType fType;
 };
 
@@ -27,13 +29,13 @@ constexpr StatementWord kStatementKeywordTable[] = {
     {"return", kReturn},      {"import", kImport},      {"assert", kAssert},
     {"from", kFromImport},    {"print", kPrint},        {"del", kDelete},
     {"elif", kElifBeginning}, {"continue", kContinue},  {"with", kWith},
-    {nullptr, kUnknown},
+    {"", kUnknown},
 };
 static_assert(sizeof(kStatementKeywordTable) / sizeof(kStatementKeywordTable[0]) == 22,
               "21 statement words and the closing row");
 
 const StatementWord* FindStatementWord(const TokenText& text) {
-  for (const StatementWord* row = kStatementKeywordTable; row->fWord; row++) {
+  for (const StatementWord* row = kStatementKeywordTable; !row->fWord.empty(); row++) {
     if (text.Is(row->fWord)) return row;
   }
   return nullptr;

@@ -5,6 +5,7 @@
 #include <Python.h>
 
 #include <cstring>
+#include <string_view>
 
 struct TokenText {
   const char* fBytes;
@@ -18,8 +19,8 @@ struct TokenText {
   unsigned At(Py_ssize_t i) const {
     return i < fLength ? static_cast<unsigned char>(fBytes[i]) : 0;
   }
-  bool Is(const char* word) const {
-    const size_t n = strlen(word);
-    return static_cast<size_t>(fLength) == n && memcmp(fBytes, word, n) == 0;
+  bool Is(std::string_view word) const {
+    return static_cast<size_t>(fLength) == word.size() &&
+           memcmp(fBytes, word.data(), word.size()) == 0;
   }
 };

@@ -8,6 +8,7 @@
 
 #include <climits>
 #include <cstring>
+#include <string_view>
 
 #include "analysis/token_text.h"
 #include "assembly/line_read_state.h"
@@ -21,7 +22,7 @@
 namespace {
 
 // Words that always start a new statement; searched word by word for an exact match.
-constexpr const char* kStatementKeywords[] = {
+constexpr std::string_view kStatementKeywords[] = {
     "assert", "break", "class", "continue", "def", "del", "elif", "except", "exec",
     "finally", "from", "global", "import", "pass", "raise", "return", "try", "while",
 };
@@ -32,7 +33,7 @@ constexpr int kLongLineTokens = 50;
 TokenText TextOf(const LineReadState* state, int i) { return TokenText(state->fTokenArray[i]); }
 
 bool IsStatementKeyword(const TokenText& text) {
-  for (const char* word : kStatementKeywords) {
+  for (std::string_view word : kStatementKeywords) {
     if (text.Is(word)) return true;
   }
   return false;
@@ -44,7 +45,7 @@ bool LastTokenIsTrailingBackslash(const LineReadState* state) {
                                                   static_cast<uint16_t>(state->fLineIndex);
 }
 
-bool AnyTokenIs(const LineReadState* state, int from, int to, const char* word) {
+bool AnyTokenIs(const LineReadState* state, int from, int to, std::string_view word) {
   for (int i = from; i < to; i++) {
     if (TextOf(state, i).Is(word)) return true;
   }

@@ -37,12 +37,16 @@ PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n) {
   return bytes;
 }
 
-PyObject* CachedFixedText(TokenCache* cache, int id, const char* text) {
-  PyObject*& slot = cache->fById[id];
-  if (!slot) {
-    slot = PyBytes_FromString(text);
-    if (!slot) return nullptr;
-  }
-  Py_INCREF(slot);
-  return slot;
+PyObject* CachedFixedText(TokenCache* cache, int id) {
+  PyObject* known = cache->fById[id];
+  Py_XINCREF(known);
+  return known;
+}
+
+PyObject* StoreFixedText(TokenCache* cache, int id, const char* text) {
+  PyObject* bytes = PyBytes_FromString(text);
+  if (!bytes) return nullptr;
+  Py_XSETREF(cache->fById[id], bytes);
+  Py_INCREF(bytes);
+  return bytes;
 }

@@ -23,5 +23,8 @@ void ClearTokenCache(TokenCache* cache);
 // Returns a new reference to a bytes object holding the n bytes at p.
 PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n);
 
-// Returns a new reference to the bytes object of a fixed text that stands for a token id.
-PyObject* CachedFixedText(TokenCache* cache, int id, const char* text);
+// Returns a new reference to the fixed text stored for a token id, or nullptr if none is.
+PyObject* CachedFixedText(TokenCache* cache, int id);
+
+// Stores the fixed text that stands for a token id; returns a new reference to it.
+PyObject* StoreFixedText(TokenCache* cache, int id, const char* text);

@@ -6,6 +6,7 @@
 #include "assembly/token_list.h"
 
 #include <climits>
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 
@@ -61,21 +62,23 @@ bool KeepToken(const LineReadState* state) {
 }
 
 // Measures the indentation: tabs advance to the next tab stop, blanks count one, form feeds
-// and vertical tabs count nothing.
+// and vertical tabs count nothing. Counted modulo 2**31, so that an absurdly wide indentation
+// keeps its low 16 bits and never turns negative.
 void MeasureIndent(LineReadState* state, const char* p, const char* tokenStart, int* slot) {
-  int column = 0;
+  uint32_t column = 0;
+  const uint32_t tabWidth = static_cast<uint32_t>(state->fTabWidth);
   state->fTabsInIndent = 0;
   state->fSpacesInIndent = 0;
   for (; p < tokenStart; p++) {
     if (*p == '\t') {
-      column += state->fTabWidth - column % state->fTabWidth;
+      column += tabWidth - column % tabWidth;
       state->fTabsInIndent = 1;
     } else if (*p == ' ') {
       column++;
       state->fSpacesInIndent = 1;
     }
   }
-  *slot = column;
+  *slot = static_cast<int>(column & INT_MAX);
 }
 
 int Grow(LineReadState* state) {
@@ -121,17 +124,21 @@ PyObject* MakeToken(LineReadState* state, int lineStart, int* lineIndex, int* co
         *lineIndex = LineIndexOfOffset(state, scan.fStart);
         *column = scan.fStart - state->fLineStarts[*lineIndex];
       }
-      if (!state->fCopyStrings) return CachedFixedText(state->fCache, STRING_TOKEN, "'<string>'");
+      if (!state->fCopyStrings) {
+        PyObject* known = CachedFixedText(state->fCache, STRING_TOKEN);
+        return known ? known : StoreFixedText(state->fCache, STRING_TOKEN, StandardText(STRING_TOKEN));
+      }
       return CachedBytes(state->fCache, text + scan.fStart, scan.fEnd - scan.fStart);
     case ERROR_TOKEN:
       return MakeErrorToken(state, lineIndex, column);
     default: {
+      if (PyObject* known = CachedFixedText(state->fCache, id)) return known;
       const char* fixed = FixedText(state, id);
       if (!fixed) {
         RaiseBadInternalCall(kTokenTextCheckLine);
         return nullptr;
       }
-      return CachedFixedText(state->fCache, id, fixed);
+      return StoreFixedText(state->fCache, id, fixed);
     }
   }
 }

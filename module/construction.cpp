@@ -52,37 +52,34 @@ PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
   return PyObject_Call(hook, hookArgs.Get(), nullptr);
 }
 
-// Fills the token arrays; returns -1 with MemoryError set.
-int CopyTokens(LogicalLine* line, const LineParts& parts) {
+// Fills the token references, positions and line text. They share one heap block, in that
+// order, so that a line costs a single allocation. Returns -1 with MemoryError set.
+int FillStorage(LogicalLine* line, const LineParts& parts) {
   const size_t count = static_cast<size_t>(parts.fTokenCount);
-  line->fTokenArray = static_cast<PyObject**>(malloc((count ? count : 1) * sizeof(PyObject*)));
-  if (!line->fTokenArray) {
+  const size_t tokenBytes = count * sizeof(PyObject*);
+  const size_t positionBytes = parts.fPositions ? count * sizeof(TokenPosition) : 0;
+  const size_t textBytes = parts.fLineText ? parts.fLineTextLength + 1 : 0;
+  char* block = static_cast<char*>(malloc(tokenBytes + positionBytes + textBytes + 1));
+  if (!block) {
     PyErr_NoMemory();
     return -1;
   }
+  line->fTokenArray = reinterpret_cast<PyObject**>(block);
   for (size_t i = 0; i < count; i++) {
     Py_XINCREF(parts.fTokens[i]);
     line->fTokenArray[i] = parts.fTokens[i];
   }
   line->fTokenCount = parts.fTokenCount;
-  if (!parts.fPositions) return 0;
-  line->fTokenPositions =
-      static_cast<TokenPosition*>(malloc((count ? count : 1) * sizeof(TokenPosition)));
-  if (!line->fTokenPositions) {
-    PyErr_NoMemory();
-    return -1;
+  if (parts.fPositions) {
+    line->fTokenPositions = reinterpret_cast<TokenPosition*>(block + tokenBytes);
+    if (count) memcpy(line->fTokenPositions, parts.fPositions, positionBytes);
   }
-  if (count) memcpy(line->fTokenPositions, parts.fPositions, count * sizeof(TokenPosition));
+  if (parts.fLineText) {
+    line->fLineText = block + tokenBytes + positionBytes;
+    memcpy(line->fLineText, parts.fLineText, parts.fLineTextLength);
+    line->fLineText[parts.fLineTextLength] = '\0';
+  }
   return 0;
-}
-
-void CopyLineText(LogicalLine* line, const LineParts& parts) {
-  if (!parts.fLineText) return;
-  // Without memory for the copy the line simply carries no text.
-  line->fLineText = static_cast<char*>(malloc(parts.fLineTextLength + 1));
-  if (!line->fLineText) return;
-  memcpy(line->fLineText, parts.fLineText, parts.fLineTextLength);
-  line->fLineText[parts.fLineTextLength] = '\0';
 }
 
 uint8_t FlagIf(int condition, LineFlag flag) { return condition ? flag : 0; }
@@ -94,7 +91,7 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts) {
   LogicalLine* line = NewLogicalLine();
   if (!line) return nullptr;
   PyRef owner = PyRef::Steal(reinterpret_cast<PyObject*>(line));  // releases a half-built line
-  if (CopyTokens(line, parts) != 0) return nullptr;
+  if (FillStorage(line, parts) != 0) return nullptr;
   line->fIndentLevel = static_cast<int16_t>(parts.fIndentLevel);
   line->fFirstLine = parts.fFirstLine;
   line->fLineCount = static_cast<int16_t>(parts.fLineCount);
@@ -103,7 +100,6 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts) {
   line->fFlags = FlagIf(parts.fSpacesInIndent, kSpacesInIndentFlag) |
                  FlagIf(parts.fTabsInIndent, kTabsInIndentFlag) |
                  FlagIf(parts.fIncomplete, kIncompleteFlag);
-  CopyLineText(line, parts);
   // fTokens is built at its first read: most hosts never look at every line's tokens.
   return owner.Release();
 }

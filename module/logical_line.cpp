@@ -169,11 +169,11 @@ PyMethodDef kLineMethods[] = {
 
 void LineDealloc(PyObject* self) {
   LogicalLine* line = AsLine(self);
-  free(line->fTokenPositions);
+  // The positions and the line text live in the token array's block.
   line->fTokenPositions = nullptr;
+  line->fLineText = nullptr;
   if (line->fTokenArray) ReleaseArray(line->fTokenArray, line->fTokenCount);
   line->fTokenArray = nullptr;
-  free(line->fLineText);
   ClearNames(line);
   ClearTypeEquivs(line);
   Py_XDECREF(line->fScopeName);

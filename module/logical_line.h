@@ -18,8 +18,9 @@ enum LineFlag : uint8_t {
 
 struct LogicalLine {
   PyObject_HEAD
-  PyObject** fTokenArray;          // fTokenCount owned references, usually bytes
-  TokenPosition* fTokenPositions;  // fTokenCount positions, or null
+  PyObject** fTokenArray;          // fTokenCount owned references, usually bytes; a heap block
+                                   // that also holds fTokenPositions and fLineText
+  TokenPosition* fTokenPositions;  // fTokenCount positions inside fTokenArray's block, or null
   int32_t fFirstLine;
   int32_t fTokenCount;
   Py_ssize_t fNameCount;
@@ -33,7 +34,7 @@ struct LogicalLine {
   PyObject** fNames;          // fNameCount owned references; capacity is the count made even
   PyObject** fTypeEquivs;     // fTypeEquivCount pairs, stored flat
   PyObject** fArgTypeEquivs;  // fArgTypeEquivCount pairs, stored flat
-  char* fLineText;            // own NUL-terminated copy, or null
+  char* fLineText;            // own NUL-terminated copy inside fTokenArray's block, or null
   PyObject* fTokensTuple;     // cache of fTokens; the tokens never change once set
   PyObject* fLocalScopeName;  // the defined name on a class or function line, else None
 };

@@ -2,7 +2,6 @@
 // under "!=".
 #include "tokenizer/operator_table.h"
 
-#include <cstring>
 
 namespace {
 
@@ -47,6 +46,14 @@ struct GroupIndex {
 
 constexpr GroupIndex kGroupIndex;
 
+// True when the whole spelling lies within [p, end) and equals its bytes.
+bool SpellingMatches(const char* spelling, const char* p, const char* end) {
+  for (; *spelling; spelling++, p++) {
+    if (p == end || *p != *spelling) return false;
+  }
+  return true;
+}
+
 }  // namespace
 
 const OperatorTable kOperatorTable = {kOperatorsByText, kByTextCount, kOperatorsById, kByIdCount,
@@ -59,11 +66,9 @@ const OperatorEntry* FindOperator(const OperatorTable* table, const char* p, con
   if (start < 0) return nullptr;
   const OperatorEntry* last = table->fByText + table->fByTextCount;
   const OperatorEntry* found = nullptr;
-  const size_t available = static_cast<size_t>(end - p);
   for (const OperatorEntry* row = table->fByText + start; row < last && row->fSpelling[0] == first;
        row++) {
-    const size_t n = strlen(row->fSpelling);
-    if (n <= available && memcmp(row->fSpelling, p, n) == 0) found = row;
+    if (SpellingMatches(row->fSpelling, p, end)) found = row;
   }
   return found;
 }

@@ -67,10 +67,12 @@ const char* ScanStringStart(const char* p, const char* end, ScanState* state) {
 
 int TokenIdForStart(const OperatorTable* table, const char* p, const char* end) {
   if (p >= end) return ERROR_TOKEN;
+  const unsigned b = Byte(p);
+  // Most tokens are names that no string prefix can begin: decide those at once.
+  if (HasClass(b, kNameChar) && !HasClass(b, kAsciiDigit | kPrefixLetter)) return NAME_TOKEN;
   ScanState scratch{};
   if (ScanStringStart(p, end, &scratch)) return STRING_TOKEN;
   if (IsIdentifierStart(p, end)) return NAME_TOKEN;
-  const unsigned b = Byte(p);
   if (IsLineBreak(b)) return NEWLINE_TOKEN;
   if (IsAsciiDigit(b)) return NUMBER_TOKEN;
   if (b == '.' && p + 1 < end && IsAsciiDigit(Byte(p + 1))) return NUMBER_TOKEN;
