@@ -1,19 +1,19 @@
-"""Pure-Python model of the logical line reader, to cross-check the native module with.
-
-It walks the same bytes the same way: character classes, token starts, the line scanner, the
-token list, the logical line builder, the reading loop and the classifier. Clarity comes
-first; regular expressions only speed up plain ASCII runs.
-"""
+"""Pure-Python model of the logical line reader, to cross-check the native module with. Clarity
+comes first; regular expressions only speed up plain ASCII runs."""
 import bisect
 import re
 from types import SimpleNamespace
 
 NAME, NUMBER, STRING, NEWLINE, ERROR, COMMENT = 1, 2, 3, 4, 201, 202
-LINE_TYPE_NAMES = (
-    "kUnknown", "kClassDef", "kFunctionDef", "kStringExpression", "kAssignment",
-    "kIfBeginning", "kElseBeginning", "kWhileBeginning", "kForBeginning", "kPass", "kRaise",
-    "kTry", "kExcept", "kFinally", "kAssert", "kReturn", "kImport", "kFromImport", "kPrint",
-    "kDelete", "kElifBeginning", "kComment", "kBlankLine", "kBreak", "kContinue", "kWith")
+# Line type constants in value order, with the bytes each holds.
+LINE_TYPES = dict(zip(
+    "kUnknown kClassDef kFunctionDef kStringExpression kAssignment kIfBeginning kElseBeginning "
+    "kWhileBeginning kForBeginning kPass kRaise kTry kExcept kFinally kAssert kReturn kImport "
+    "kFromImport kPrint kDelete kElifBeginning kComment kBlankLine kBreak kContinue kWith".split(),
+    b"unknown,class definition,function definition,string expression,assignment,if statement "
+    b"start,else statement start,while statement start,for statement start,pass,raise,try block "
+    b"start,except block start,finally block start,assert,return,import,from import,print,delete,"
+    b"elif block start,comment,blank line,break,continue,with block start".split(b",")))
 UNKNOWN, CLASS_DEF, FUNCTION_DEF, STRING_EXPRESSION, ASSIGNMENT, COMMENT_LINE, BLANK_LINE = (
     0, 1, 2, 3, 4, 21, 22)
 
@@ -36,8 +36,9 @@ LINE_KEYWORDS = dict(zip(b"class def if else while for pass raise break try exce
                           24, 25)))
 
 
-def first_code_unit(b, p, end):
+def first_code_unit(b, p=0, end=None):
     """Low 16 bits of the first character's code point; 0 when it cannot be decoded."""
+    end = len(b) if end is None else end
     b0 = b[p] if p < end else 0
     if b0 < 0x80:
         return b0
@@ -52,8 +53,7 @@ def first_code_unit(b, p, end):
 
 
 def step_char(b, p, end):
-    """Position after the character at p. A malformed sequence stops at the first byte that
-    is no continuation byte, so a stray lead byte never swallows the ASCII byte after it."""
+    # A malformed sequence stops before the first byte that is no continuation byte.
     b0 = b[p]
     stop = min(end, p + (1 if b0 < 0x80 else 2 if b0 < 0xE0 else 3 if b0 < 0xF0 else
                          4 if b0 < 0xF8 else 3))
@@ -113,10 +113,7 @@ def token_id_for_start(b, p=0, end=None):
 
 def escaped(b, k, stop):
     """True when an odd run of backslashes ends just before k, not looking back past stop."""
-    n = 0
-    while k - 1 - n >= stop and b[k - 1 - n] == 0x5C:
-        n += 1
-    return n % 2 == 1
+    return (k - stop - len(b[stop:k].rstrip(b"\\"))) % 2 == 1
 
 
 def scan_string_body(b, st, frm, end):
@@ -149,8 +146,7 @@ def scan_number(b, p, end):
 
 
 def scan_next_token(b, st, pos, end):
-    """Scans the next token of the physical line ending at end into st; returns the position
-    after it, or None when the line holds no further token."""
+    """Scans the token at pos into st; returns the position after it, or None at the end."""
     if pos >= end:
         return None
     if st.tok == STRING and not st.complete:   # the line begins inside an open string
@@ -199,7 +195,7 @@ class Builder:
         # Scanner state; complete is 0 while a string runs on to the next physical line.
         self.scan = SimpleNamespace(tok=0, start=-1, end=-1, complete=0, quote=0, triple=0)
         self.tokens, self.positions = [], []
-        self.line_index = self.nesting = self.significant = 0
+        self.line_index = self.nesting = 0
         self.indent, self.tabs, self.spaces = -1, 0, 0
 
     def position(self, start):
@@ -234,13 +230,10 @@ class Builder:
     def append(self, text, position):
         self.tokens.append(text)
         self.positions.append(position)
-        self.significant += text[:1] not in (b"#", b"\n")
         self.nesting += nesting_delta(text)
 
     def hand_back(self, k):
-        for text in self.tokens[k:]:
-            self.significant -= text[:1] not in (b"#", b"\n")
-            self.nesting -= nesting_delta(text)
+        self.nesting -= sum(map(nesting_delta, self.tokens[k:]))
         del self.tokens[k:], self.positions[k:]
         self.text = self.text[:self.line_starts.pop()]
         self.scan.complete = 1  # a string the handed-back line opened is not ours to report
@@ -313,7 +306,7 @@ def build_logical_line(src, lineno, copy_strings, skip_whitespace_lines, remove_
         end = st.end if st.end > st.start else len(bld.text)
         bld.append(ERROR_PREFIX + bld.text[st.start:end], bld.position(st.start))
         is_open = True
-    if not bld.tokens or (skip_whitespace_lines and bld.significant == 0):
+    if not bld.tokens or (skip_whitespace_lines and all(t[:1] == b"#" for t in bld.tokens)):
         return None, lineno
     if first < 0:
         raise SystemError("bad internal call")
@@ -325,6 +318,9 @@ def build_logical_line(src, lineno, copy_strings, skip_whitespace_lines, remove_
         indent=bld.indent, tabs=bld.tabs, spaces=bld.spaces, incomplete=int(is_open),
         tokens=bld.tokens, positions=[(i & 0xFFFF, c & 0xFFFF) for i, c in bld.positions],
         line_text=bld.text if include_line_text else None), lineno
+
+
+OPTIONS = ("copy_strings", "skip_whitespace_lines", "remove_comments", "include_line_text")
 
 
 def model_lines(physical_lines, copy_strings=True, skip_whitespace_lines=True,

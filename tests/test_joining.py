@@ -1,25 +1,24 @@
 """Reading source into logical lines: token cutting, joining, hand-back, positions, indentation."""
-
 import io
 
 import pytest
 
 import logicalline
+from model import OPTIONS
+from test_model_agreement import assert_agreement
 
 
-def read(source=None, chunks=None, **options):
-    """Returns the logical lines of `source`, or of `chunks` handed out one per readline call."""
-    settings = dict(copy_strings=True, skip_whitespace_lines=False, remove_comments=False)
-    settings.update(options)
-    parser = logicalline.CreateLogicalLineParser(**settings)
-    if chunks is None:
-        return parser.GetLogicalLineList(io.BytesIO(source).readline)
+def read(source, **options):
+    """The logical lines of `source`: bytes, or the chunks that readline hands out in turn."""
+    options = {"skip_whitespace_lines": False, "remove_comments": False, **options}
+    chunks = list(io.BytesIO(source)) if isinstance(source, bytes) else source
+    assert_agreement(chunks, [options.get(name, True) for name in OPTIONS])  # the model reads alike
     pieces = iter(chunks)
-    return parser.GetLogicalLineList(lambda: next(pieces))
+    return logicalline.CreateLogicalLineParser(**options).GetLogicalLineList(
+        lambda: next(pieces, b""))
 
 
 @pytest.mark.parametrize("source, tokens", [
-    (b"x = 1 # note\n", ["x", "=", "1", "# note\n"]),           # a comment keeps its line break
     (b"a<>b x->y a:=1\n", ["a", "!=", "b", "x", "->", "y", "a", ":=", "1"]),
     (b"a @= b ...\n", ["a", "@", "=", "b", "..."]),              # no "@=" operator
     (b"0x1F 1e-5 1_000 0x_FF 1.2.3 5j 10L 0x1e+5\n",
@@ -28,12 +27,10 @@ def read(source=None, chunks=None, **options):
     (b"rb'x' bu'x' Rb'' fR'y'\n", ["rb'x'", "bu", "'x'", "Rb''", "fR'y'"]),
     ("été x² a\U0001F600\n".encode(), ["été", "x²", "a", "<errortoken> \U0001F600"]),
     (b"\x0c\x0bx $ ? !\n", ["x", "<errortoken> $", "<errortoken> ?", "<errortoken> !"]),
-    (b"f(\x80)\n", ["f", "(", "<errortoken> \ufffd", ")"]),    # malformed UTF-8 keeps the ")"
     (b"a \xe2\x82 b\n", ["a", "<errortoken> \ufffd", "b"]),
-    (b"'abc\n", ["<errortoken> 'abc"]),                          # unterminated, line break excluded
     (b'"""""""\n', ['""""""', '<errortoken> "']),
     (b"'a\\'b' '\\\\' \"\"\n", ["'a\\'b'", "'\\\\'", '""']),      # escaped and escaping backslashes
-    (b"x = '''a\\'''\n'''\n", ["x", "=", "'''a\\'''\n'''"]),     # escaped closing quote keeps it open
+    (b"x = '''a\\'''\n'''\n", ["x", "=", "'''a\\'''\n'''"]),     # an escaped quote closes nothing
     (b"'abc\\\ndef'\n", ["'abc\\\ndef'"]),                       # backslash-newline inside a string
     (b"s = 'x\\\ny\n", ["s", "=", "<errortoken> 'x\\\ny"]),
     (b"x = 1 + '''abc\ndef\n", ["x", "=", "1", "+", "<errortoken> '''abc\ndef\n"]),
@@ -44,61 +41,63 @@ def test_tokens_are_cut_and_listed(source, tokens):
     assert [text for line in read(source) for text, _ in line.fTokens] == tokens
 
 
+@pytest.mark.parametrize("source", [
+    b"x = (1,\n     2)\n", b"y = 1 \\\n  + 2\n", b"s = '''a\n  z'''\n",
+    b"x = ((((((((((1\n))))))))))\n", b"f(a,\nprint, with, Def, if_)\n",  # no statement words
+    b"x = [a\nfor a in b]\n", b"x = (a if b\nelse c)\n", b"x = (a\nif b else c)\n",
+    b"x = [a for a in b\nif a]\n",
+    b"x = (" + b"1," * 23 + b"1\nelse)\n",  # 50 tokens before the "else"
+    b"x = (" + b"1," * 22 + b"\nif a)\n",   # 50 tokens with the "if" line
+    b"x = 1 \\\nfor\n", b"x = a \\\nif b\n", b"x = a \\\nelse\n", b"x = \\\nimport y\n",
+])
+def test_two_physical_lines_join(source):
+    assert [(ln.fLineCount, ln.fIncomplete) for ln in read(source)] == [(2, 0)]
+
+
+# A physical line that starts a statement is handed back: it begins the next logical line.
+@pytest.mark.parametrize("source", [
+    b"f(a,\ndef g(): pass\n", b"x = (1,\n@dec\n", b"f(a,\nexec)\n", b"x = (a,\nelse c)\n",
+    b"x = (a,\nif b)\n",
+    b"x = 1 + \\\n@dec\n",                     # "@" even after a backslash
+    b"(a, \\\nreturn)\n",                      # inside brackets a backslash won't keep it
+    b"x = (" + b"1," * 23 + b"\nelse)\n",      # 49 tokens before the "else"
+    b"x = (" + b"1," * 21 + b"1\nif a)\n",     # 49 tokens with the "if" line
+])
+def test_statement_start_is_handed_back(source):
+    assert [(ln.fFirstLine, ln.fLineCount, ln.fIncomplete) for ln in read(source)] == [
+        (0, 1, 1), (1, 1, 0)]
+
+
 @pytest.mark.parametrize("source, lines", [
-    (b"x = (1,\n     2)\n", [(0, 2, 0)]),
     (b"x = (1,\n\n# c\n 2)\ny = 2\n", [(0, 4, 0), (4, 1, 0)]),
-    (b"y = 1 \\\n  + 2\n", [(0, 2, 0)]),
     (b"a = ')'\nb = '('\n", [(0, 1, 0), (1, 1, 0)]),
-    (b"s = '''a\n  z'''\n", [(0, 2, 0)]),
-    (b"x = ((((((((((1\n))))))))))\n", [(0, 2, 0)]),
     (b"f(a", [(0, 1, 1)]),                                     # input ends inside brackets
     (b"x = 1 + '''abc\ndef\n", [(0, 2, 1)]),                   # input ends inside a string
     (b"x = 1 \\\n", [(0, 1, 1)]),
     (b")\nx = 1\n", [(0, 1, 0), (1, 1, 0)]),                   # negative depth is not open
-    # Hand-back: the physical line that starts a statement begins the next logical line.
-    (b"f(a,\ndef g(): pass\n", [(0, 1, 1), (1, 1, 0)]),
     (b"f(a,\ndef g(b,\n c): pass\n", [(0, 1, 1), (1, 2, 0)]),
     (b"x = (1,\nreturn '''a\nb'''\n", [(0, 1, 1), (1, 2, 0)]),
-    (b"x = (1,\n@dec\n", [(0, 1, 1), (1, 1, 0)]),
-    (b"x = 1 + \\\n@dec\n", [(0, 1, 1), (1, 1, 0)]),            # "@" even after a backslash
-    (b"(a, \\\nreturn)\n", [(0, 1, 1), (1, 1, 0)]),             # inside brackets a backslash won't keep it
-    (b"f(a,\nexec)\n", [(0, 1, 1), (1, 1, 0)]),
-    (b"f(a,\nprint, with, Def, if_)\n", [(0, 2, 0)]),           # no statement words
-    (b"x = [a\nfor a in b]\n", [(0, 2, 0)]),
-    (b"x = (a if b\nelse c)\n", [(0, 2, 0)]),
-    (b"x = (a,\nelse c)\n", [(0, 1, 1), (1, 1, 0)]),
-    (b"x = (" + b"1," * 23 + b"\nelse)\n", [(0, 1, 1), (1, 1, 0)]),  # 49 tokens before
-    (b"x = (" + b"1," * 23 + b"1\nelse)\n", [(0, 2, 0)]),              # 50 tokens before
-    (b"x = (a\nif b else c)\n", [(0, 2, 0)]),
-    (b"x = (a,\nif b)\n", [(0, 1, 1), (1, 1, 0)]),
-    (b"x = (a,\nif b,\n c)\n", [(0, 3, 0)]),                     # still open after the "if" line
-    (b"x = [a for a in b\nif a]\n", [(0, 2, 0)]),
-    (b"x = (1,\nif a) \\\n+ 2\n", [(0, 3, 0)]),                   # "if" line ends in a backslash
-    (b"x = (" + b"1," * 21 + b"1\nif a)\n", [(0, 1, 1), (1, 1, 0)]),  # 49 tokens with the "if" line
-    (b"x = (" + b"1," * 22 + b"\nif a)\n", [(0, 2, 0)]),               # 50 tokens
-    (b"x = 1 \\\nfor\n", [(0, 2, 0)]),                             # a backslash outside brackets joins
-    (b"x = a \\\nif b\n", [(0, 2, 0)]),
-    (b"x = a \\\nelse\n", [(0, 2, 0)]),
-    (b"x = \\\nimport y\n", [(0, 2, 0)]),
+    (b"a = (1,\ndef f(): '''x\ny'''\n", [(0, 1, 1), (1, 2, 0)]),  # the next line's string
+    (b"x = (a,\nif b,\n c)\n", [(0, 3, 0)]),                   # still open after the "if" line
+    (b"x = (1,\nif a) \\\n+ 2\n", [(0, 3, 0)]),                # "if" line ends in a backslash
 ])
-def test_physical_lines_join_or_are_handed_back(source, lines):
+def test_logical_line_ranges(source, lines):
     assert [(ln.fFirstLine, ln.fLineCount, ln.fIncomplete) for ln in read(source)] == lines
 
 
 def test_handed_back_line_is_not_in_the_line_text():
-    lines = read(b"x = (1,\n  return 2\n", include_line_text=True)
+    lines = read(b"x = (1,\n  return 2\n")
     assert [ln.fLineText for ln in lines] == ["x = (1,\n", "  return 2\n"]
     assert lines[1].fIndentLevel == 2 and lines[1].fSpacesInIndent
 
 
 @pytest.mark.parametrize("chunks, lines", [
-    ([b"   ", b"x = 1\n", b""], [(1, 1)]),               # blanks without a break join nothing
-    ([b"  ", b"x = (1,\n", b"2)\n", b""], [(1, 2)]),
-    ([b"\n", b"   \n", b"x\n", b"   ", b""], [(2, 1)]),
-    ([b""], []),
+    ([b"  ", b"x = (1,\n", b"2)\n"], [(1, 2)]),
+    ([b"\n", b"   \n", b"x\n", b"   "], [(2, 1)]),
+    ([], []),
 ])
 def test_blank_lines_give_nothing(chunks, lines):
-    assert [(ln.fFirstLine, ln.fLineCount) for ln in read(chunks=chunks)] == lines
+    assert [(ln.fFirstLine, ln.fLineCount) for ln in read(chunks)] == lines
 
 
 @pytest.mark.parametrize("chunks, positions", [
@@ -111,7 +110,7 @@ def test_blank_lines_give_nothing(chunks, lines):
     ([b"x = (1,\r\n", b" 2)\r\n"], [(0, 0), (0, 2), (0, 4), (0, 5), (0, 6), (1, 1), (1, 2)]),
 ])
 def test_tokens_are_placed_on_the_physical_line_where_they_begin(chunks, positions):
-    (line,) = read(chunks=chunks + [b""])
+    (line,) = read(chunks)
     assert [position for _, position in line.fTokens] == positions
 
 
@@ -121,10 +120,8 @@ def test_placeholder_string_stands_where_the_string_begins():
 
 
 @pytest.mark.parametrize("source, indent, tabs, spaces", [
-    (b"x\n", 0, False, False),
-    (b"\t  x\n", 10, True, True),
-    (b" \tx\n", 8, True, True),
-    (b"\t\tx\n", 16, True, False),
+    (b"x\n", 0, False, False), (b"\t  x\n", 10, True, True),
+    (b" \tx\n", 8, True, True), (b"\t\tx\n", 16, True, False),
     (b"\x0cx\n", 0, False, False),                  # a form feed counts nothing
     (b"   # c\n", 3, False, True),                  # comments measure too
     (b"  f(1,\n\t\t2)\n", 2, False, True),          # only the first physical line counts

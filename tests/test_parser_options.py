@@ -4,16 +4,11 @@ import itertools
 import pytest
 
 import logicalline
-
-OPTIONS = ("copy_strings", "skip_whitespace_lines", "remove_comments", "include_line_text")
-# The order in which the parser takes the options' truth values.
-TRUTH_ORDER = ("skip_whitespace_lines", "remove_comments", "copy_strings", "include_line_text")
-SOURCE = b"# lead\ns = 'a'  # tail\n"
+from model import OPTIONS
 
 
 def effects(parser):
-    """Returns what the parser makes of SOURCE: the token texts of each line and its text."""
-    lines = parser.GetLogicalLineList(io.BytesIO(SOURCE).readline)
+    lines = parser.GetLogicalLineList(io.BytesIO(b"# lead\ns = 'a'  # tail\n").readline)
     return [([text for text, _ in line.fTokens], line.fLineText) for line in lines]
 
 
@@ -26,53 +21,32 @@ def expected(copy_strings, skip_whitespace_lines, remove_comments, include_line_
     return lines
 
 
-def test_defaults_turn_every_option_on():
-    assert effects(logicalline.CreateLogicalLineParser()) == expected(True, True, True, True)
+@pytest.mark.parametrize("number, flags", list(enumerate(itertools.product((0, 1), repeat=4))))
+def test_options(number, flags):
+    # The first few go by position, the others by keyword, or are left to default to on.
+    k = number % 5
+    keywords = {name: flag for name, flag in zip(OPTIONS[k:], flags[k:]) if not flag}
+    assert effects(logicalline.CreateLogicalLineParser(*flags[:k], **keywords)) == expected(*flags)
 
 
-@pytest.mark.parametrize("flags", list(itertools.product((0, 1), repeat=4)))
-def test_positional_options(flags):
-    assert effects(logicalline.CreateLogicalLineParser(*flags)) == expected(*flags)
-
-
-@pytest.mark.parametrize("name", OPTIONS)
-def test_single_keyword_leaves_the_others_on(name):
-    parser = logicalline.CreateLogicalLineParser(**{name: False})
-    assert effects(parser) == expected(*(option != name for option in OPTIONS))
-
-
-@pytest.mark.parametrize("value, truth", [
-    ([], False), ("x", True), ("", False), (None, False), (0.0, False), ((0,), True),
-    (object(), True), (-1, True),
-])
-def test_options_take_truth_values(value, truth):
+@pytest.mark.parametrize("value", [[], "x", "", None, 0.0, (0,), object(), -1])
+def test_options_take_truth_values(value):
     parser = logicalline.CreateLogicalLineParser(value, value, remove_comments=value,
                                                  include_line_text=value)
-    assert effects(parser) == expected(truth, truth, truth, truth)
+    assert effects(parser) == expected(*[bool(value)] * 4)
 
 
 class Raising:
-    def __init__(self, error):
-        self.error = error
+    def __init__(self, name):
+        self.name = name
 
     def __bool__(self):
-        raise self.error
+        raise LookupError(self.name)
 
 
 @pytest.mark.parametrize("first", range(4))
-def test_first_raising_truth_test_propagates(first):
-    # Every option from `first` on raises; the earliest one in truth order must win.
-    raising = {name: Raising(LookupError(name)) for name in TRUTH_ORDER[first:]}
-    with pytest.raises(LookupError) as info:
-        logicalline.CreateLogicalLineParser(**raising)
-    assert info.value.args == (TRUTH_ORDER[first],)
-
-
-@pytest.mark.parametrize("args, kwargs", [
-    ((1, 1, 1, 1, 1), {}),
-    ((), {"strip_comments": True}),
-    ((1,), {"copy_strings": True}),
-])
-def test_bad_arguments_are_refused(args, kwargs):
-    with pytest.raises(TypeError):
-        logicalline.CreateLogicalLineParser(*args, **kwargs)
+def test_truth_tests_are_made_in_order(first):
+    order = ("skip_whitespace_lines", "remove_comments", "copy_strings", "include_line_text")
+    with pytest.raises(LookupError) as info:  # every option from `first` on raises
+        logicalline.CreateLogicalLineParser(**{name: Raising(name) for name in order[first:]})
+    assert info.value.args == (order[first],)

@@ -1,9 +1,9 @@
-"""Compares tokens and logical line ends with `tokenize` over the standard library: a sample of
-files by default, every file with --full-stdlib. Each of the reader's own rules adjusts what
-`tokenize` gives in one place below."""
-
+"""Compares tokens and logical line ends with `tokenize` over the standard library (a sample, or
+every file with --full-stdlib). Each of the reader's own rules adjusts tokenize's output once."""
 import bisect
+import glob
 import io
+import itertools
 import os
 import re
 import sys
@@ -15,50 +15,38 @@ import pytest
 import logicalline
 
 ROOT = os.path.dirname(os.__file__)
-SAMPLE_SIZE = 80
 SKIPPED = {token.ENCODING, token.NEWLINE, token.NL, token.INDENT, token.DEDENT, token.ENDMARKER}
 # Newer versions split f-strings (and t-strings) into parts; the reader keeps one string token.
 STRING_STARTS = {getattr(token, n) for n in ("FSTRING_START", "TSTRING_START") if hasattr(token, n)}
 STRING_ENDS = {getattr(token, n) for n in ("FSTRING_END", "TSTRING_END") if hasattr(token, n)}
-# A number runs on over dots, hex letters and suffixes without checking its form: "1.5e100."
-# in "1.5e100.__format__" is one number.
+# A number runs on over dots, hex letters and suffixes: "1.5e100." is one number.
 NUMBER_RUN = re.compile(rb"[0-9.](?:[0-9a-fA-F.jJlLoOxX]|(?<=[eE])[+-]"
                         rb"|(?<=[0-9a-fA-FoOxX])_(?=[0-9a-fA-F]))*")
 # First tokens of a physical line that the reader takes for a new statement inside brackets.
-STATEMENT_STARTS = {"@", "if", "else", "for", "assert", "break", "class", "continue", "def", "del",
-                    "elif", "except", "exec", "finally", "from", "global", "import", "pass",
-                    "raise", "return", "try", "while"}
+STATEMENT_STARTS = set("@ if else for assert break class continue def del elif except exec "
+                       "finally from global import pass raise return try while".split())
 # Before 3.12 tokenize ends a name before U+E0100, which continues identifiers.
 TOKENIZE_FALLS_SHORT = {"test/test_unicode_identifiers.py"} if sys.version_info < (3, 12) else set()
 
 
-def library_files():
-    files = []
-    for folder, subfolders, names in os.walk(ROOT):
-        subfolders[:] = sorted(d for d in subfolders if d not in ("site-packages", "__pycache__"))
-        files += [os.path.relpath(os.path.join(folder, n), ROOT) for n in sorted(names)
-                  if n.endswith(".py")]
-    return files
-
-
 def pytest_generate_tests(metafunc):
     if "path" in metafunc.fixturenames:
-        files = library_files()
-        if not metafunc.config.getoption("--full-stdlib"):
-            files = files[::max(1, len(files) // SAMPLE_SIZE)]
-        metafunc.parametrize("path", files)
+        files = sorted(os.path.relpath(path, ROOT) for path in
+                       glob.glob(os.path.join(ROOT, "**", "*.py"), recursive=True)
+                       if "-packages" not in path)
+        full = metafunc.config.getoption("--full-stdlib")
+        metafunc.parametrize("path", files if full else files[::len(files) // 80])
 
 
 def expected_tokens(source):
-    """Returns tokenize's tokens as the reader lists them, and the rows where NEWLINEs stand."""
+    """tokenize's tokens as the reader lists them, and the rows where NEWLINEs stand."""
     rows = io.BytesIO(source).readlines()
-    starts = [0]
-    for row in rows:
-        starts.append(starts[-1] + len(row))
+    starts = list(itertools.accumulate(map(len, rows), initial=0))
 
     def offset(row, col):  # tokenize counts columns in characters, the reader in bytes
-        return starts[row - 1] + len(rows[row - 1].decode()[:col].encode()) if row <= len(rows) \
-            else starts[-1]
+        if row > len(rows):
+            return starts[-1]
+        return starts[row - 1] + len(rows[row - 1].decode()[:col].encode())
 
     def place(at):
         row = bisect.bisect_right(starts, at)
@@ -86,10 +74,9 @@ def expected_tokens(source):
             continue
         if start < absorbed:
             continue
-        # Backslash continuations are listed as tokens of their own.
+        # Backslash continuations are tokens of their own.
         tokens += [("\\", place(i)) for i in range(done, start) if source[i] == ord("\\")]
-        done = end
-        text = tok.string
+        done, text = end, tok.string
         if tok.type in STRING_STARTS:
             nesting, string_start = 1, start
             continue
@@ -102,16 +89,15 @@ def expected_tokens(source):
         elif tok.type == token.NUMBER:
             absorbed = NUMBER_RUN.match(source, start).end()
             text = source[start:absorbed].decode()
-        elif text == "<" and source[end:end + 1] == b">":  # "<>" is listed as "!="
+        elif text == "<" and source[end:end + 1] == b">":
             text, absorbed = "!=", end + 1
         elif tok.type == token.NAME and not text.isidentifier() or \
-                tok.type == token.ERRORTOKEN and text != "`":
-            # "`" is an operator to the reader; newer tokenize calls "€" a name
+                tok.type == token.ERRORTOKEN and text != "`":  # "`" is an operator here
             text = "<errortoken> " + text
         if text == "@=":  # no such operator: "@" and then "="
             tokens += [("@", place(start)), ("=", place(start + 1))]
-            continue
-        tokens.append((text, place(start)))
+        else:
+            tokens.append((text, place(start)))
     return tokens, newline_rows
 
 
@@ -133,20 +119,16 @@ def test_reader_agrees_with_tokenize(path):
         expected, newline_rows = expected_tokens(source)
     except (SyntaxError, tokenize.TokenError, UnicodeDecodeError) as error:
         pytest.skip(f"tokenize cannot read it: {error!r}")
+    assert [(text, (line.fFirstLine + row, col))
+            for line in lines for text, (row, col) in line.fTokens] == expected
 
-    got = [(text, (line.fFirstLine + row, col))
-           for line in lines for text, (row, col) in line.fTokens]
-    assert got == expected
-
-    # Logical lines end where tokenize puts a NEWLINE. The only other ends come from a physical
-    # line that begins a statement inside open brackets: the reader hands it back and ends the
-    # open line there, incomplete; lines after it may end early until the NEWLINE is reached.
+    # Logical lines end where tokenize puts a NEWLINE, or where a physical line that begins a
+    # statement inside open brackets is handed back: the open line ends there, incomplete, and
+    # lines after it may end early until the NEWLINE is reached.
     lines = [line for line in lines if any(text[0] != "#" for text, _ in line.fTokens)]
     ends = [line.fFirstLine + line.fLineCount - 1 for line in lines]
     assert newline_rows <= set(ends)
     for i, line in enumerate(lines):
-        if ends[i] in newline_rows or (i and ends[i - 1] not in newline_rows):
-            continue
-        successor = lines[i + 1]
-        assert line.fIncomplete and successor.fFirstLine == ends[i] + 1, ends[i]
-        assert successor.fTokens[0][0] in STATEMENT_STARTS, ends[i]
+        if ends[i] not in newline_rows and (i == 0 or ends[i - 1] in newline_rows):
+            assert line.fIncomplete and lines[i + 1].fFirstLine == ends[i] + 1, ends[i]
+            assert lines[i + 1].fTokens[0][0] in STATEMENT_STARTS, ends[i]
