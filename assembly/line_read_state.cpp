@@ -4,6 +4,7 @@
 
 #include "assembly/line_read_state.h"
 
+#include <climits>
 #include <cstdlib>
 #include <cstring>
 
@@ -45,13 +46,16 @@ void ReleaseLineReadState(LineReadState* state) {
 int NoteLineStart(LineReadState* state, int offset) {
   const int index = state->fLineIndex;
   if (index >= state->fLineStartCapacity) {
-    const int capacity = state->fLineStartCapacity * 2;
+    // Offsets are 32-bit and every line holds a byte, so the count stays below INT_MAX.
+    const int capacity = state->fLineStartCapacity > INT_MAX / 2 ? INT_MAX
+                                                                  : state->fLineStartCapacity * 2;
     int* starts;
     if (state->fLineStarts == state->fInlineLineStarts) {
-      starts = static_cast<int*>(malloc(sizeof(int) * capacity));
+      starts = static_cast<int*>(malloc(sizeof(int) * static_cast<size_t>(capacity)));
       if (starts) memcpy(starts, state->fInlineLineStarts, sizeof(state->fInlineLineStarts));
     } else {
-      starts = static_cast<int*>(realloc(state->fLineStarts, sizeof(int) * capacity));
+      starts = static_cast<int*>(
+          realloc(state->fLineStarts, sizeof(int) * static_cast<size_t>(capacity)));
     }
     if (!starts) {
       PyErr_NoMemory();

@@ -1,0 +1,174 @@
+"""Leak checks, run with --leaks: every public operation, error paths included, is repeated and
+must leave references and memory where they were. Exact on a debug interpreter (its reference
+total; fuzz/leaks_debug.sh); everywhere the interpreter's block count, the C heap's bytes in use
+(glibc's mallinfo2) and the reference counts of the objects that the operations store."""
+
+import copy
+import ctypes
+import gc
+import io
+import itertools
+import os
+import subprocess
+import sys
+
+import pytest
+
+import logicalline
+
+sys.path.insert(0, os.path.join(os.path.dirname(__file__), "..", "fuzz"))
+import direct_table  # noqa: E402
+
+ROUNDS = 200
+SOURCE = (b"@deco\nclass C(Base):\n    def f(self, a,\n          b=')'):\n"
+          b"        '''doc\r\n  more'''\n        return a \\\n  + b  # note\n"
+          b"x = f(1,\nif y: pass\ncaf\xe9 = '\xff' <> $ \t\n# only a comment\n   \n"
+          b"import os, sys\nfrom a import (b,\n    c)\ns = 'open\n")
+STORED = ["name", ("a", "info"), b"raw"]
+OPTIONS = ("copy_strings", "skip_whitespace_lines", "remove_comments", "include_line_text")
+DIRECT = direct_table.LoadTable()
+
+
+class Heap(ctypes.Structure):  # glibc's struct mallinfo2
+    _fields_ = [(name, ctypes.c_size_t) for name in "arena ordblks smblks hblks hblkhd usmblks "
+                "fsmblks uordblks fordblks keepcost".split()]
+
+
+def heap_in_use():
+    """Bytes the C heap has handed out (0 under an ASan runtime, which keeps no such count)."""
+    mallinfo2 = ctypes.CDLL(None).mallinfo2
+    mallinfo2.restype = Heap
+    heap = mallinfo2()
+    return heap.uordblks + heap.hblkhd
+
+
+def usage():
+    gc.collect()
+    return [getattr(sys, "gettotalrefcount", int)(), sys.getallocatedblocks(), heap_in_use(),
+            *map(sys.getrefcount, STORED)]
+
+
+def assert_no_growth(operation):
+    """Runs `operation` ROUNDS times, then ROUNDS more that must grow nothing. A one-off growth
+    (an interpreter cache filling up) gets two more tries; a leak grows on every one."""
+    for _ in range(ROUNDS):
+        operation()
+    for _ in range(3):
+        before = usage()
+        for _ in range(ROUNDS):
+            operation()
+        growth = [after - start for start, after in zip(before, usage())]
+        if (growth[0] < ROUNDS // 4 and growth[1] < ROUNDS // 4 and growth[2] < ROUNDS * 8
+                and growth[3:] == [0] * len(STORED)):
+            return
+    raise AssertionError(f"references, blocks, heap bytes, stored objects grew: {growth}")
+
+
+@pytest.fixture(autouse=True)
+def opt_in(request):
+    if not request.config.getoption("--leaks"):
+        pytest.skip("leak checks run with --leaks")
+
+
+def read(source=SOURCE, *limits, **options):
+    parser = logicalline.CreateLogicalLineParser(**options)
+    return parser.GetLogicalLineList(io.BytesIO(source).readline, *limits)
+
+
+def attempt(call, *args, **kwargs):
+    """Calls, letting through the exceptions that bad input gets."""
+    try:
+        call(*args, **kwargs)
+    except (ValueError, TypeError, IndexError, OverflowError, SystemError, ZeroDivisionError):
+        pass
+
+
+UNTRUTHFUL = type("Untruthful", (), {"__bool__": lambda self: 1 / 0})()
+
+
+def parse_with_every_option_set():
+    for flags in itertools.product((0, 1), repeat=4):
+        for line in read(**dict(zip(OPTIONS, flags))):
+            for name in dir(line):
+                if name.startswith("f"):
+                    attempt(getattr, line, name)  # fLineText of invalid UTF-8 raises
+
+
+def parse_failures():
+    parser = logicalline.CreateLogicalLineParser()
+    pending = [b"x = (1,\n"]
+    attempt(parser.GetLogicalLineList, lambda: pending.pop() if pending else 1 / 0)
+    for bad in ("x\n", None, bytearray(b"x\n")):
+        attempt(parser.GetLogicalLineList, lambda: bad)
+    for args in ((5,), (print, "x"), (io.BytesIO(b"y\x00\n").readline,)):
+        attempt(parser.GetLogicalLineList, *args)
+    for limits in ((2**31 - 2,), (-5,), (3, 4), (0, 0)):
+        attempt(read, SOURCE, *limits)
+    attempt(logicalline.CreateLogicalLineParser, UNTRUTHFUL)
+
+
+def methods():
+    for line in read():
+        for i, skip in itertools.product((0, 5, -1, 99), (0, 1)):
+            attempt(line.GetTokenType, i, skip_error_prefix=skip)
+            attempt(line.GetTokenString, i, skip)
+        attempt(line.GetTokenType, "0")
+        for name in ("AppendAttrib", "AppendArgName", "AppendBaseClassName", "AppendTypeEquiv",
+                     "AppendArgTypeEquiv", "SetScopeName", "SetParsed"):
+            attempt(getattr(line, name), *STORED[:2 if "Equiv" in name else 1])
+        attempt(line.SetParsed, UNTRUTHFUL)
+        attempt(line.SetLineRange, 2**40, 1)
+        copy.deepcopy(line).Copy(1, 2, 3)
+        line.SetLineRange(0, 0)
+        attempt(line.Copy)
+    logicalline.GetIdForTokenStart(b"<<=")
+    logicalline._GetFirstCodeUnit("\U0001f600")
+    attempt(logicalline.GetIdForTokenStart, 5)
+
+
+def direct_entries():
+    lines = [DIRECT.CreateEmptyLogical(), *read(b"class C: pass\ndef f(a): pass\nx = 1\n")]
+    DIRECT.GetLogicalTypeObject()
+    for line in lines:
+        for entry, args in (
+                (DIRECT.AppendTypeEquivDirect, STORED[:2]), (DIRECT.AppendAttribDirect, STORED[:1]),
+                (DIRECT.AppendArgTypeEquivDirect, STORED[1:]), (DIRECT.GetArgName, (5,)),
+                (DIRECT.AppendArgNameDirect, STORED[1:2]), (DIRECT.GetArgName, (0,)),
+                (DIRECT.AppendBaseClassNameDirect, STORED[2:]),
+                (DIRECT.GetTokenTypeDirect, (0, 1)), (DIRECT.GetTokenTypeDirect, (9, 0))):
+            attempt(entry, line, *args)
+        DIRECT.IsLogical(line), DIRECT.GetArgNameCount(line), DIRECT.GetNamesDefined(line)
+        DIRECT.ClearAppended(line)
+    for text in (b"<errortoken> 'x", "name", "\udc80", None):
+        attempt(DIRECT.GetStringTokenTypeDirect, text, 1)  # "\udc80": UnicodeEncodeError
+
+
+@pytest.mark.parametrize("operation", [parse_with_every_option_set, parse_failures, methods,
+                                       direct_entries])
+def test_operation_leaks_nothing(operation):
+    assert_no_growth(operation)
+
+
+def hooks():
+    """Runs in a subprocess: a create hook stays installed until the process ends."""
+    kinds = itertools.cycle(range(5))
+
+    def hook(*parts):
+        kind = next(kinds)
+        if kind == 1:
+            raise ValueError(parts[0])
+        if kind == 2:
+            logicalline.SetLogicalCreateFunction(hook)  # replaces itself while running
+        if kind == 3 and parts[1] == 0:
+            return read(parts[8].encode(), 1)  # nested
+        return parts if kind else None
+    logicalline.SetLogicalCreateFunction(hook)
+    assert_no_growth(lambda: [attempt(read, source)  # b"\xff": UnicodeDecodeError
+                              for source in (b"x = 1\ny = (\n2)\n", SOURCE, b"x = '\xff'\n")])
+
+
+def test_create_hook_paths_leak_nothing():
+    code = "import sys; sys.path.insert(0, %r); import test_leaks; test_leaks.hooks()"
+    done = subprocess.run([sys.executable, "-c", code % os.path.dirname(__file__)],
+                          capture_output=True, text=True, timeout=300)
+    assert done.returncode == 0, done.stderr
