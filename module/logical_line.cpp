@@ -4,6 +4,7 @@
 
 #include "module/logical_line.h"
 
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 
@@ -238,44 +239,88 @@ void ClearTypeEquivs(LogicalLine* line) {
   line->fArgTypeEquivCount = 0;
 }
 
-PyObject* MakeTokenEntry(LogicalLine* line, Py_ssize_t index) {
+namespace {
+
+// Texts already decoded while building one fTokens tuple. The reader hands out one object per
+// repeated token text, so a repeated token decodes once. The texts are borrowed: the entries
+// built so far hold them.
+struct DecodedTexts {
+  static constexpr uintptr_t kSlots = 64;
+  PyObject* fToken[kSlots] = {};
+  PyObject* fText[kSlots] = {};
+};
+
+PyObject* NewPair(PyObject* first, PyObject* second) {
+  PyObject* pair = PyTuple_New(2);
+  if (!pair) return nullptr;
+  Py_INCREF(first);
+  PyTuple_SET_ITEM(pair, 0, first);
+  Py_INCREF(second);
+  PyTuple_SET_ITEM(pair, 1, second);
+  return pair;
+}
+
+PyObject* PositionOf(LogicalLine* line, Py_ssize_t index) {
+  if (!line->fTokenPositions) Py_RETURN_NONE;
+  const TokenPosition& pair = line->fTokenPositions[index];
+  PyRef row = PyRef::Steal(NewInt(pair.fLine));
+  if (!row) return nullptr;
+  PyRef column = PyRef::Steal(NewInt(pair.fColumn));
+  if (!column) return nullptr;
+  PyObject* position = NewPair(row.Get(), column.Get());
+  if (position) UntrackAtomicTuple(position);
+  return position;
+}
+
+// Returns a new reference to the str shown for a token: str and None as they are, bytes
+// decoded with U+FFFD for malformed sequences.
+PyObject* TextOf(PyObject* token, DecodedTexts* decoded) {
+  if (token == Py_None || PyUnicode_Check(token)) {
+    Py_INCREF(token);
+    return token;
+  }
+  const uintptr_t slot = (reinterpret_cast<uintptr_t>(token) >> 4) % DecodedTexts::kSlots;
+  if (decoded && decoded->fToken[slot] == token) {
+    Py_INCREF(decoded->fText[slot]);
+    return decoded->fText[slot];
+  }
+  PyObject* text =
+      PyUnicode_DecodeUTF8(PyBytes_AS_STRING(token), PyBytes_GET_SIZE(token), "replace");
+  if (text && decoded) {
+    decoded->fToken[slot] = token;
+    decoded->fText[slot] = text;
+  }
+  return text;
+}
+
+PyObject* MakeEntry(LogicalLine* line, Py_ssize_t index, DecodedTexts* decoded) {
   if (index < 0 || index >= line->fTokenCount) {
     PyErr_SetString(PyExc_IndexError, "Invalid token index");
     return nullptr;
   }
-  PyRef position;
-  if (!line->fTokenPositions) {
-    position = PyRef::FromBorrowed(Py_None);
-  } else {
-    const TokenPosition& pair = line->fTokenPositions[index];
-    PyRef row = PyRef::Steal(NewInt(pair.fLine));
-    if (!row) return nullptr;
-    PyRef column = PyRef::Steal(NewInt(pair.fColumn));
-    if (!column) return nullptr;
-    position = PyRef::Steal(PyTuple_Pack(2, row.Get(), column.Get()));
-    if (!position) return nullptr;
-    UntrackAtomicTuple(position.Get());
-  }
-  PyObject* token = line->fTokenArray[index];
-  PyRef text;
-  if (token == Py_None || PyUnicode_Check(token)) {
-    text = PyRef::FromBorrowed(token);
-  } else {
-    text = PyRef::Steal(PyUnicode_DecodeUTF8(PyBytes_AS_STRING(token), PyBytes_GET_SIZE(token),
-                                             "replace"));
-    if (!text) return nullptr;
-  }
-  PyObject* entry = PyTuple_Pack(2, text.Get(), position.Get());
-  if (entry && (token == Py_None || PyUnicode_CheckExact(text.Get()))) UntrackAtomicTuple(entry);
+  PyRef position = PyRef::Steal(PositionOf(line, index));
+  if (!position) return nullptr;
+  PyRef text = PyRef::Steal(TextOf(line->fTokenArray[index], decoded));
+  if (!text) return nullptr;
+  PyObject* entry = NewPair(text.Get(), position.Get());
+  if (entry && (text.Get() == Py_None || PyUnicode_CheckExact(text.Get())))
+    UntrackAtomicTuple(entry);
   return entry;
+}
+
+}  // namespace
+
+PyObject* MakeTokenEntry(LogicalLine* line, Py_ssize_t index) {
+  return MakeEntry(line, index, nullptr);
 }
 
 PyObject* BuildTokensTuple(LogicalLine* line) {
   PyRef tuple = PyRef::Steal(PyTuple_New(line->fTokenCount));
   if (!tuple) return nullptr;
+  DecodedTexts decoded;
   bool atomic = true;
   for (Py_ssize_t i = 0; i < line->fTokenCount; i++) {
-    PyObject* entry = MakeTokenEntry(line, i);
+    PyObject* entry = MakeEntry(line, i, &decoded);
     if (!entry) return nullptr;
     atomic = atomic && !PyObject_GC_IsTracked(entry);
     PyTuple_SET_ITEM(tuple.Get(), i, entry);
