@@ -162,9 +162,10 @@ PyObject* FinishLogicalLine(LineReadState* state, int64_t firstLine, int64_t lin
 }  // namespace
 
 PyObject* BuildLogicalLine(LogicalLineParser* parser, PyObject* readline, TextBuffer* pending,
-                           int64_t* lineNumber, int* atEnd, TokenCache* cache) {
+                           int64_t* lineNumber, int* atEnd, TokenCache* cache,
+                           TokenStorage* storage) {
   LineReadState state;
-  InitLineReadState(&state, parser, cache);
+  InitLineReadState(&state, parser, cache, storage);
   const int64_t firstLine = *lineNumber;
   int indent = -1;
   int open = 0;

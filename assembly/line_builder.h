@@ -7,6 +7,7 @@
 
 #include <cstdint>
 
+#include "assembly/line_read_state.h"
 #include "assembly/text_buffer.h"
 #include "assembly/token_cache.h"
 #include "module/parser.h"
@@ -16,4 +17,5 @@
 // *lineNumber is the number of the next physical line to read and advances by the lines
 // consumed.
 PyObject* BuildLogicalLine(LogicalLineParser* parser, PyObject* readline, TextBuffer* pending,
-                           int64_t* lineNumber, int* atEnd, TokenCache* cache);
+                           int64_t* lineNumber, int* atEnd, TokenCache* cache,
+                           TokenStorage* storage);

@@ -8,15 +8,28 @@
 #include <cstdlib>
 #include <cstring>
 
-void InitLineReadState(LineReadState* state, LogicalLineParser* parser, TokenCache* cache) {
+void InitTokenStorage(TokenStorage* storage) {
+  storage->fTokenArray = nullptr;
+  storage->fTokenPositions = nullptr;
+  storage->fTokenCapacity = 0;
+}
+
+void ReleaseTokenStorage(TokenStorage* storage) {
+  free(storage->fTokenArray);
+  free(storage->fTokenPositions);
+  InitTokenStorage(storage);
+}
+
+void InitLineReadState(LineReadState* state, LogicalLineParser* parser, TokenCache* cache,
+                       TokenStorage* storage) {
   state->fParser = parser;
   InitTextBuffer(&state->fText);
   state->fTextLength = 0;
   state->fScan = ScanState{0, -1, -1, 0, 0, 0};
-  state->fTokenArray = nullptr;
-  state->fTokenPositions = nullptr;
+  state->fTokenArray = storage->fTokenArray;
+  state->fTokenPositions = storage->fTokenPositions;
   state->fTokenCount = 0;
-  state->fTokenCapacity = 0;
+  state->fTokenCapacity = storage->fTokenCapacity;
   state->fCopyStrings = parser->fCopyStrings;
   state->fTabsInIndent = 0;
   state->fSpacesInIndent = 0;
@@ -27,12 +40,14 @@ void InitLineReadState(LineReadState* state, LogicalLineParser* parser, TokenCac
   state->fLineStarts = state->fInlineLineStarts;
   state->fLineStartCapacity = kInlineLineStarts;
   state->fCache = cache;
+  state->fStorage = storage;
 }
 
 void ReleaseLineReadState(LineReadState* state) {
   for (int i = 0; i < state->fTokenCount; i++) Py_DECREF(state->fTokenArray[i]);
-  free(state->fTokenArray);
-  free(state->fTokenPositions);
+  state->fStorage->fTokenArray = state->fTokenArray;
+  state->fStorage->fTokenPositions = state->fTokenPositions;
+  state->fStorage->fTokenCapacity = state->fTokenCapacity;
   state->fTokenArray = nullptr;
   state->fTokenPositions = nullptr;
   state->fTokenCount = 0;

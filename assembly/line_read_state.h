@@ -12,6 +12,19 @@
 
 constexpr int kInlineLineStarts = 8;
 
+// Token arrays that the reading loop keeps from one logical line to the next, so that a line
+// does not allocate arrays of its own.
+struct TokenStorage {
+  PyObject** fTokenArray;
+  TokenPosition* fTokenPositions;
+  int fTokenCapacity;
+};
+
+void InitTokenStorage(TokenStorage* storage);
+
+// Frees the arrays.
+void ReleaseTokenStorage(TokenStorage* storage);
+
 struct LineReadState {
   LogicalLineParser* fParser;  // borrowed
   TextBuffer fText;            // every physical line read for this logical line
@@ -32,11 +45,14 @@ struct LineReadState {
   int fLineStartCapacity;
   int fInlineLineStarts[kInlineLineStarts];
   TokenCache* fCache;      // owned by the reading loop
+  TokenStorage* fStorage;  // owned by the reading loop; lends the token arrays
 };
 
-void InitLineReadState(LineReadState* state, LogicalLineParser* parser, TokenCache* cache);
+void InitLineReadState(LineReadState* state, LogicalLineParser* parser, TokenCache* cache,
+                       TokenStorage* storage);
 
-// Releases every listed token and frees every block the state holds.
+// Releases every listed token and every block the state holds, and returns the token arrays
+// to the storage.
 void ReleaseLineReadState(LineReadState* state);
 
 // Records where physical line fLineIndex starts. Returns 0, or -1 with MemoryError set.

@@ -9,6 +9,7 @@
 
 void InitTokenCache(TokenCache* cache) {
   memset(cache->fSlots, 0, sizeof(cache->fSlots));
+  memset(cache->fHashes, 0, sizeof(cache->fHashes));
   memset(cache->fById, 0, sizeof(cache->fById));
 }
 
@@ -17,21 +18,31 @@ void ClearTokenCache(TokenCache* cache) {
   for (PyObject*& slot : cache->fById) Py_CLEAR(slot);
 }
 
+// Mixes the first and last eight bytes and the length: enough to spread token texts over the
+// slots, at a fixed cost whatever the length.
 static uint32_t HashText(const char* p, Py_ssize_t n) {
-  uint32_t hash = 2166136261u;
-  for (Py_ssize_t i = 0; i < n; i++) hash = (hash ^ static_cast<unsigned char>(p[i])) * 16777619u;
-  return hash;
+  uint64_t head = 0;
+  uint64_t tail = 0;
+  memcpy(&head, p, static_cast<size_t>(n < 8 ? n : 8));
+  if (n > 8) memcpy(&tail, p + n - 8, 8);
+  const uint64_t mixed = (head ^ (tail * 0x9E3779B97F4A7C15ull) ^ static_cast<uint64_t>(n)) *
+                         0xFF51AFD7ED558CCDull;
+  return static_cast<uint32_t>(mixed >> 32);
 }
 
 PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n) {
   if (n > kCachedTextLimit || n <= 1) return PyBytes_FromStringAndSize(p, n);
-  PyObject*& slot = cache->fSlots[HashText(p, n) & (kTokenCacheSlots - 1)];
-  if (slot && PyBytes_GET_SIZE(slot) == n && memcmp(PyBytes_AS_STRING(slot), p, n) == 0) {
+  const uint32_t hash = HashText(p, n);
+  const uint32_t index = hash & (kTokenCacheSlots - 1);
+  PyObject*& slot = cache->fSlots[index];
+  if (slot && cache->fHashes[index] == hash && PyBytes_GET_SIZE(slot) == n &&
+      memcmp(PyBytes_AS_STRING(slot), p, static_cast<size_t>(n)) == 0) {
     Py_INCREF(slot);
     return slot;
   }
   PyObject* bytes = PyBytes_FromStringAndSize(p, n);
   if (!bytes) return nullptr;
+  cache->fHashes[index] = hash;
   Py_XSETREF(slot, bytes);
   Py_INCREF(bytes);
   return bytes;

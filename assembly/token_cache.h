@@ -5,6 +5,8 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
+#include <cstdint>
+
 #include "tokenizer/token_ids.h"
 
 constexpr int kTokenCacheSlots = 4096;      // a power of two
@@ -12,6 +14,7 @@ constexpr Py_ssize_t kCachedTextLimit = 40;  // longer texts are rarely repeated
 
 struct TokenCache {
   PyObject* fSlots[kTokenCacheSlots];  // owned bytes objects, or null
+  uint32_t fHashes[kTokenCacheSlots];  // hash of each slot's text, checked before the text
   PyObject* fById[kTokenIdLimit];      // owned fixed texts of operators and placeholders
 };
 

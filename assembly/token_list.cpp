@@ -117,8 +117,9 @@ PyObject* MakeToken(LineReadState* state, int lineStart, int* lineIndex, int* co
   switch (id) {
     case NAME_TOKEN:
     case NUMBER_TOKEN:
-    case COMMENT_TOKEN:
       return CachedBytes(state->fCache, text + scan.fStart, scan.fEnd - scan.fStart);
+    case COMMENT_TOKEN:  // rarely repeated: not worth a cache slot
+      return PyBytes_FromStringAndSize(text + scan.fStart, scan.fEnd - scan.fStart);
     case STRING_TOKEN:
       if (scan.fStart < lineStart) {  // began on an earlier physical line
         *lineIndex = LineIndexOfOffset(state, scan.fStart);
@@ -128,7 +129,7 @@ PyObject* MakeToken(LineReadState* state, int lineStart, int* lineIndex, int* co
         PyObject* known = CachedFixedText(state->fCache, STRING_TOKEN);
         return known ? known : StoreFixedText(state->fCache, STRING_TOKEN, StandardText(STRING_TOKEN));
       }
-      return CachedBytes(state->fCache, text + scan.fStart, scan.fEnd - scan.fStart);
+      return PyBytes_FromStringAndSize(text + scan.fStart, scan.fEnd - scan.fStart);
     case ERROR_TOKEN:
       return MakeErrorToken(state, lineIndex, column);
     default: {

@@ -30,10 +30,15 @@ struct ReadingState {
   int64_t fLineNumber;  // the next physical line to read
   int fAtEnd;
   TokenCache* fCache;
+  TokenStorage fStorage;  // token arrays lent to each logical line in turn
 
-  ReadingState() : fLineNumber(0), fAtEnd(0), fCache(nullptr) { InitTextBuffer(&fPending); }
+  ReadingState() : fLineNumber(0), fAtEnd(0), fCache(nullptr) {
+    InitTextBuffer(&fPending);
+    InitTokenStorage(&fStorage);
+  }
   ~ReadingState() {
     ResetTextBuffer(&fPending);
+    ReleaseTokenStorage(&fStorage);
     if (fCache) {
       ClearTokenCache(fCache);
       PyMem_Free(fCache);
@@ -58,7 +63,7 @@ int ReadLines(LogicalLineParser* parser, PyObject* readline, int firstLine, int 
   while (!(hasStop && reading.fLineNumber >= stop) && !reading.fAtEnd) {
     PyRef line = PyRef::Steal(BuildLogicalLine(parser, readline, &reading.fPending,
                                                &reading.fLineNumber, &reading.fAtEnd,
-                                               reading.fCache));
+                                               reading.fCache, &reading.fStorage));
     if (!line) return -1;
     if (line.Get() == Py_None) continue;
     if (PyList_Append(list, line.Get()) != 0) return -1;
