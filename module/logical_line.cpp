@@ -241,13 +241,15 @@ void ClearTypeEquivs(LogicalLine* line) {
 
 namespace {
 
-// Texts already decoded while building one fTokens tuple. The reader hands out one object per
-// repeated token text, so a repeated token decodes once. The texts are borrowed: the entries
-// built so far hold them.
-struct DecodedTexts {
+// What the entries of one fTokens tuple can share. The reader hands out one object per
+// repeated token text, so a repeated token decodes once, and the tokens of one physical line
+// share its line index. Both are borrowed: the entries built so far hold them.
+struct EntryParts {
   static constexpr uintptr_t kSlots = 64;
   PyObject* fToken[kSlots] = {};
   PyObject* fText[kSlots] = {};
+  PyObject* fLineObject = nullptr;
+  uint16_t fLine = 0;
 };
 
 PyObject* NewPair(PyObject* first, PyObject* second) {
@@ -260,10 +262,24 @@ PyObject* NewPair(PyObject* first, PyObject* second) {
   return pair;
 }
 
-PyObject* PositionOf(LogicalLine* line, Py_ssize_t index) {
+// Returns a new reference to the int for a line index.
+PyObject* LineIndexObject(uint16_t lineIndex, EntryParts* shared) {
+  if (shared && shared->fLineObject && shared->fLine == lineIndex) {
+    Py_INCREF(shared->fLineObject);
+    return shared->fLineObject;
+  }
+  PyObject* row = NewInt(lineIndex);
+  if (row && shared) {
+    shared->fLineObject = row;
+    shared->fLine = lineIndex;
+  }
+  return row;
+}
+
+PyObject* PositionOf(LogicalLine* line, Py_ssize_t index, EntryParts* shared) {
   if (!line->fTokenPositions) Py_RETURN_NONE;
   const TokenPosition& pair = line->fTokenPositions[index];
-  PyRef row = PyRef::Steal(NewInt(pair.fLine));
+  PyRef row = PyRef::Steal(LineIndexObject(pair.fLine, shared));
   if (!row) return nullptr;
   PyRef column = PyRef::Steal(NewInt(pair.fColumn));
   if (!column) return nullptr;
@@ -274,33 +290,33 @@ PyObject* PositionOf(LogicalLine* line, Py_ssize_t index) {
 
 // Returns a new reference to the str shown for a token: str and None as they are, bytes
 // decoded with U+FFFD for malformed sequences.
-PyObject* TextOf(PyObject* token, DecodedTexts* decoded) {
+PyObject* TextOf(PyObject* token, EntryParts* shared) {
   if (token == Py_None || PyUnicode_Check(token)) {
     Py_INCREF(token);
     return token;
   }
-  const uintptr_t slot = (reinterpret_cast<uintptr_t>(token) >> 4) % DecodedTexts::kSlots;
-  if (decoded && decoded->fToken[slot] == token) {
-    Py_INCREF(decoded->fText[slot]);
-    return decoded->fText[slot];
+  const uintptr_t slot = (reinterpret_cast<uintptr_t>(token) >> 4) % EntryParts::kSlots;
+  if (shared && shared->fToken[slot] == token) {
+    Py_INCREF(shared->fText[slot]);
+    return shared->fText[slot];
   }
   PyObject* text =
       PyUnicode_DecodeUTF8(PyBytes_AS_STRING(token), PyBytes_GET_SIZE(token), "replace");
-  if (text && decoded) {
-    decoded->fToken[slot] = token;
-    decoded->fText[slot] = text;
+  if (text && shared) {
+    shared->fToken[slot] = token;
+    shared->fText[slot] = text;
   }
   return text;
 }
 
-PyObject* MakeEntry(LogicalLine* line, Py_ssize_t index, DecodedTexts* decoded) {
+PyObject* MakeEntry(LogicalLine* line, Py_ssize_t index, EntryParts* shared) {
   if (index < 0 || index >= line->fTokenCount) {
     PyErr_SetString(PyExc_IndexError, "Invalid token index");
     return nullptr;
   }
-  PyRef position = PyRef::Steal(PositionOf(line, index));
+  PyRef position = PyRef::Steal(PositionOf(line, index, shared));
   if (!position) return nullptr;
-  PyRef text = PyRef::Steal(TextOf(line->fTokenArray[index], decoded));
+  PyRef text = PyRef::Steal(TextOf(line->fTokenArray[index], shared));
   if (!text) return nullptr;
   PyObject* entry = NewPair(text.Get(), position.Get());
   if (entry && (text.Get() == Py_None || PyUnicode_CheckExact(text.Get())))
@@ -317,10 +333,10 @@ PyObject* MakeTokenEntry(LogicalLine* line, Py_ssize_t index) {
 PyObject* BuildTokensTuple(LogicalLine* line) {
   PyRef tuple = PyRef::Steal(PyTuple_New(line->fTokenCount));
   if (!tuple) return nullptr;
-  DecodedTexts decoded;
+  EntryParts shared;
   bool atomic = true;
   for (Py_ssize_t i = 0; i < line->fTokenCount; i++) {
-    PyObject* entry = MakeEntry(line, i, &decoded);
+    PyObject* entry = MakeEntry(line, i, &shared);
     if (!entry) return nullptr;
     atomic = atomic && !PyObject_GC_IsTracked(entry);
     PyTuple_SET_ITEM(tuple.Get(), i, entry);
