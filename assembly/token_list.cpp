@@ -17,9 +17,6 @@
 
 namespace {
 
-constexpr char kErrorPrefix[] = "<errortoken> ";
-constexpr Py_ssize_t kErrorPrefixLength = sizeof(kErrorPrefix) - 1;
-
 struct StandardTokenText {
   unsigned fId;
   const char* fText;

@@ -14,3 +14,7 @@ constexpr int COMMENT_TOKEN = 202;
 constexpr int BACKSLASH_TOKEN = 203;
 
 constexpr int kTokenIdLimit = 204;  // every id is below this
+
+// Marks the text of an error token; the source bytes follow it.
+constexpr char kErrorPrefix[] = "<errortoken> ";
+constexpr int kErrorPrefixLength = sizeof(kErrorPrefix) - 1;

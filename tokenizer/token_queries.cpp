@@ -23,9 +23,6 @@ const char kGetTokenStringDoc[] =
 
 namespace {
 
-constexpr char kErrorPrefix[] = "<errortoken> ";
-constexpr Py_ssize_t kErrorPrefixLength = sizeof(kErrorPrefix) - 1;
-
 bool HasErrorPrefix(const char* bytes, Py_ssize_t n) {
   return n >= kErrorPrefixLength && memcmp(bytes, kErrorPrefix, kErrorPrefixLength) == 0;
 }
