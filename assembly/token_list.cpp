@@ -104,6 +104,18 @@ int Grow(LineReadState* state) {
   return 0;
 }
 
+// Returns the token object of an id whose text is fixed: an operator's canonical text, or a
+// standard token text such as the string placeholder. Made once per reading call.
+PyObject* FixedToken(LineReadState* state, int id) {
+  if (PyObject* known = CachedFixedText(state->fCache, id)) return known;
+  const char* fixed = FixedText(state, id);
+  if (!fixed) {
+    RaiseBadInternalCall(kTokenTextCheckLine);
+    return nullptr;
+  }
+  return StoreFixedText(state->fCache, id, fixed);
+}
+
 // Builds the object for the token the scanner just completed, and its position.
 PyObject* MakeToken(LineReadState* state, int lineStart, int* lineIndex, int* column) {
   const ScanState& scan = state->fScan;
@@ -122,22 +134,12 @@ PyObject* MakeToken(LineReadState* state, int lineStart, int* lineIndex, int* co
         *lineIndex = LineIndexOfOffset(state, scan.fStart);
         *column = scan.fStart - state->fLineStarts[*lineIndex];
       }
-      if (!state->fCopyStrings) {
-        PyObject* known = CachedFixedText(state->fCache, STRING_TOKEN);
-        return known ? known : StoreFixedText(state->fCache, STRING_TOKEN, StandardText(STRING_TOKEN));
-      }
+      if (!state->fCopyStrings) return FixedToken(state, STRING_TOKEN);
       return PyBytes_FromStringAndSize(text + scan.fStart, scan.fEnd - scan.fStart);
     case ERROR_TOKEN:
       return MakeErrorToken(state, lineIndex, column);
-    default: {
-      if (PyObject* known = CachedFixedText(state->fCache, id)) return known;
-      const char* fixed = FixedText(state, id);
-      if (!fixed) {
-        RaiseBadInternalCall(kTokenTextCheckLine);
-        return nullptr;
-      }
-      return StoreFixedText(state->fCache, id, fixed);
-    }
+    default:
+      return FixedToken(state, id);
   }
 }
 

@@ -239,8 +239,6 @@ void ClearTypeEquivs(LogicalLine* line) {
   line->fArgTypeEquivCount = 0;
 }
 
-namespace {
-
 // What the entries of one fTokens tuple can share. The reader hands out one object per
 // repeated token text, so a repeated token decodes once, and the tokens of one physical line
 // share its line index. Both are borrowed: the entries built so far hold them.
@@ -251,6 +249,8 @@ struct EntryParts {
   PyObject* fLineObject = nullptr;
   uint16_t fLine = 0;
 };
+
+namespace {
 
 PyObject* NewPair(PyObject* first, PyObject* second) {
   PyObject* pair = PyTuple_New(2);
@@ -309,7 +309,9 @@ PyObject* TextOf(PyObject* token, EntryParts* shared) {
   return text;
 }
 
-PyObject* MakeEntry(LogicalLine* line, Py_ssize_t index, EntryParts* shared) {
+}  // namespace
+
+PyObject* MakeTokenEntry(LogicalLine* line, Py_ssize_t index, EntryParts* shared) {
   if (index < 0 || index >= line->fTokenCount) {
     PyErr_SetString(PyExc_IndexError, "Invalid token index");
     return nullptr;
@@ -324,11 +326,6 @@ PyObject* MakeEntry(LogicalLine* line, Py_ssize_t index, EntryParts* shared) {
   return entry;
 }
 
-}  // namespace
-
-PyObject* MakeTokenEntry(LogicalLine* line, Py_ssize_t index) {
-  return MakeEntry(line, index, nullptr);
-}
 
 PyObject* BuildTokensTuple(LogicalLine* line) {
   PyRef tuple = PyRef::Steal(PyTuple_New(line->fTokenCount));
@@ -336,7 +333,7 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
   EntryParts shared;
   bool atomic = true;
   for (Py_ssize_t i = 0; i < line->fTokenCount; i++) {
-    PyObject* entry = MakeEntry(line, i, &shared);
+    PyObject* entry = MakeTokenEntry(line, i, &shared);
     if (!entry) return nullptr;
     atomic = atomic && !PyObject_GC_IsTracked(entry);
     PyTuple_SET_ITEM(tuple.Get(), i, entry);

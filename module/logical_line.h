@@ -50,8 +50,12 @@ void ClearNames(LogicalLine* line);
 // Releases both pair lists and frees their arrays.
 void ClearTypeEquivs(LogicalLine* line);
 
-// Returns element `index` of fTokens: (text, (line index, column) or None).
-PyObject* MakeTokenEntry(LogicalLine* line, Py_ssize_t index);
+// What the entries of one fTokens tuple share while it is built.
+struct EntryParts;
+
+// Returns element `index` of fTokens: (text, (line index, column) or None). `shared`, when
+// given, lets entries of one tuple share their texts and line indices.
+PyObject* MakeTokenEntry(LogicalLine* line, Py_ssize_t index, EntryParts* shared);
 
 // Returns the value of fTokens, built anew.
 PyObject* BuildTokensTuple(LogicalLine* line);
