@@ -1,0 +1,41 @@
+"""The host guide's examples: its sessions run, its typed snippets type-check, its C excerpts are
+quoted from the native example as it stands."""
+import doctest
+import pathlib
+import re
+
+from test_type_stub import run_mypy
+
+ROOT = pathlib.Path(__file__).resolve().parent.parent
+GUIDE = ROOT / "docs" / "host_guide.md"
+NATIVE_SOURCE = ROOT / "examples" / "native_host" / "native_host.c"
+
+
+def blocks(language):
+    return re.findall(rf"^```{language}\n(.*?)^```$", GUIDE.read_text(), re.S | re.M)
+
+
+def test_sessions(monkeypatch):
+    monkeypatch.chdir(ROOT)  # the guide opens a file of this repository by its relative path
+    result = doctest.testfile(str(GUIDE), module_relative=False, verbose=False,
+                              optionflags=doctest.ELLIPSIS)
+    assert result.attempted > 40 and result.failed == 0
+
+
+def test_typed_snippets(tmp_path):
+    snippets = [code for code in blocks("python") if ">>>" not in code]
+    assert snippets
+    for number, code in enumerate(snippets):
+        path = tmp_path / f"snippet_{number}.py"
+        path.write_text(code)
+        result = run_mypy(path)
+        assert result.returncode == 0, result.stdout + result.stderr
+        exec(compile(code, str(path), "exec"), {"__name__": "snippet"})
+
+
+def test_c_excerpts_are_quoted_from_the_native_example():
+    source = NATIVE_SOURCE.read_text()
+    excerpts = blocks("c")
+    assert len(excerpts) >= 2
+    for excerpt in excerpts:
+        assert excerpt in source, excerpt
