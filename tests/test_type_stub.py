@@ -76,15 +76,19 @@ logicalline.SetLogicalCreateFunction(lambda: None)
 '''
 
 
-def run_mypy(*paths):
+def run_mypy(*paths, tool=("mypy", "--strict", "--no-incremental", "--no-error-summary")):
     pytest.importorskip("mypy", reason="mypy comes with the test extras")
     environment = dict(os.environ)
     environment.pop("MYPYPATH", None)
     if not INSTALLED:  # a build tree: point mypy at the stub beside the module
         environment["MYPYPATH"] = str(MODULE_DIR)
-    return subprocess.run([sys.executable, "-m", "mypy", "--strict", "--no-incremental",
-                           "--no-error-summary", *map(str, paths)],
+    return subprocess.run([sys.executable, "-m", *tool, *map(str, paths)],
                           capture_output=True, text=True, env=environment, cwd=HERE.parent)
+
+
+def test_stubtest_finds_the_stub_consistent_with_the_module():
+    result = run_mypy("logicalline", tool=("mypy.stubtest",))
+    assert result.returncode == 0, result.stdout + result.stderr
 
 
 def test_mypy_strict_accepts_the_host_and_catches_misuse(tmp_path):
