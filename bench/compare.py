@@ -762,33 +762,21 @@ def RunOps(corpus, runs):
     def KeepPython():
         return python
 
-    def NativeTokenType(lines):
-        for line in lines:
-            get = line.GetTokenType
-            for i in range(line.fTokenCount):
-                get(i)
-        return total
+    def EachToken(method, count):
+        """A body that calls `method(i)` for every token index of every line."""
+        def Body(lines):
+            for line in lines:
+                get = getattr(line, method)
+                for i in range(count(line)):
+                    get(i)
+            return total
+        return Body
 
-    def PythonTokenType(lines):
-        for line in lines:
-            get = line.get_token_type
-            for i in range(len(line.tokens)):
-                get(i)
-        return total
+    def NativeCount(line):
+        return line.fTokenCount
 
-    def NativeTokenString(lines):
-        for line in lines:
-            get = line.GetTokenString
-            for i in range(line.fTokenCount):
-                get(i)
-        return total
-
-    def PythonTokenString(lines):
-        for line in lines:
-            get = line.get_token_string
-            for i in range(len(line.tokens)):
-                get(i)
-        return total
+    def PythonCount(line):
+        return len(line.tokens)
 
     marker = ("name", None)
 
@@ -851,29 +839,21 @@ def RunOps(corpus, runs):
             line.copy()
         return len(lines)
 
-    def NativeTokensFirst(lines):
+    def NativeTokens(lines):
         for line in lines:
             line.fTokens
         return len(lines)
 
-    def PythonTokensFirst(lines):
-        for line in lines:
-            line.token_tuples
-        return len(lines)
-
-    def NativeTokensAgain(lines):
-        for line in lines:
-            line.fTokens
-        return len(lines)
-
-    def PythonTokensAgain(lines):
+    def PythonTokens(lines):
         for line in lines:
             line.token_tuples
         return len(lines)
 
     cases = [
-        ("GetTokenType(i)", KeepNative, NativeTokenType, KeepPython, PythonTokenType),
-        ("GetTokenString(i)", KeepNative, NativeTokenString, KeepPython, PythonTokenString),
+        ("GetTokenType(i)", KeepNative, EachToken("GetTokenType", NativeCount), KeepPython,
+         EachToken("get_token_type", PythonCount)),
+        ("GetTokenString(i)", KeepNative, EachToken("GetTokenString", NativeCount), KeepPython,
+         EachToken("get_token_string", PythonCount)),
         ("AppendAttrib(obj), fresh non-def lines", NativeFreshOf(NotScopeStart),
          NativeAppendAttrib, PythonFreshOf(NotScopeStart), PythonAppendAttrib),
         ("AppendArgName(obj) x3, fresh def lines", NativeFreshOf(IsFunctionDef),
@@ -881,14 +861,14 @@ def RunOps(corpus, runs):
         ("AppendTypeEquiv(a, b), fresh lines", NativeFresh, NativeAppendTypeEquiv,
          PythonFresh, PythonAppendTypeEquiv),
         ("Copy(), per line", KeepNative, NativeCopy, KeepPython, PythonCopy),
-        ("fTokens, first access per line", NativeFresh, NativeTokensFirst, PythonFresh,
-         PythonTokensFirst),
-        ("fTokens, later access per line", KeepNative, NativeTokensAgain, KeepPython,
-         PythonTokensAgain),
+        ("fTokens, first access per line", NativeFresh, NativeTokens, PythonFresh,
+         PythonTokens),
+        ("fTokens, later access per line", KeepNative, NativeTokens, KeepPython,
+         PythonTokens),
     ]
     # Warm both caches of fTokens for the "later access" row.
-    NativeTokensFirst(native)
-    PythonTokensFirst(python)
+    NativeTokens(native)
+    PythonTokens(python)
     print(f"{'operation':<42} {'calls':>9} {'module ns':>10} {'Python ns':>10} {'speedup':>8}")
     for name, native_prepare, native_body, python_prepare, python_body in cases:
         native_ns, calls = TimePerCall(runs, native_prepare, native_body)
