@@ -21,6 +21,7 @@ SIMPLE = (logicalline.kUnknown, logicalline.kStringExpression, logicalline.kPass
           logicalline.kRaise, logicalline.kAssert, logicalline.kReturn, logicalline.kPrint,
           logicalline.kDelete, logicalline.kComment, logicalline.kBlankLine, logicalline.kBreak,
           logicalline.kContinue)
+NAME_ID = logicalline.GetIdForTokenStart("name")  # token ids are learnt from sample texts
 
 
 def read(parser: LogicalLineParser, source: bytes) -> list[LogicalLine]:
@@ -76,8 +77,6 @@ def describe(line: LogicalLine) -> str:
     facts.append(f"{len(line.fTypeEquivs) + len(line.fArgTypeEquivs)} type equivalences")
     return f"{' | '.join(facts)}: {head[:40]}"
 
-
-NAME_ID = logicalline.GetIdForTokenStart("name")
 
 
 def main() -> int:

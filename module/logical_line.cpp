@@ -326,7 +326,6 @@ PyObject* MakeTokenEntry(LogicalLine* line, Py_ssize_t index, EntryParts* shared
   return entry;
 }
 
-
 PyObject* BuildTokensTuple(LogicalLine* line) {
   PyRef tuple = PyRef::Steal(PyTuple_New(line->fTokenCount));
   if (!tuple) return nullptr;

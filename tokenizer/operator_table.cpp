@@ -2,7 +2,6 @@
 // under "!=".
 #include "tokenizer/operator_table.h"
 
-
 namespace {
 
 // Rows with the same first byte are contiguous, and every row stands after each row whose
