@@ -7,17 +7,13 @@
 #include "assembly/line_builder.h"
 
 #include <climits>
-#include <cstring>
+#include <cstdint>
 #include <string_view>
 
-#include "analysis/token_text.h"
-#include "assembly/line_read_state.h"
 #include "assembly/source_reader.h"
 #include "assembly/token_list.h"
-#include "module/construction.h"
-#include "module/errors.h"
-#include "module/py_ref.h"
-#include "tokenizer/token_ids.h"
+#include "core/token_ids.h"
+#include "tokenizer/token_text.h"
 
 namespace {
 
@@ -30,7 +26,7 @@ constexpr std::string_view kStatementKeywords[] = {
 // Beyond this many tokens a line starting with "if" or "else" is taken as a continuation.
 constexpr int kLongLineTokens = 50;
 
-TokenText TextOf(const LineReadState* state, int i) { return TokenText(state->fTokenArray[i]); }
+TokenText TextOf(const ReadingState* state, int i) { return TokenText(state->fTokenArray[i]); }
 
 bool IsStatementKeyword(const TokenText& text) {
   for (std::string_view word : kStatementKeywords) {
@@ -39,20 +35,20 @@ bool IsStatementKeyword(const TokenText& text) {
   return false;
 }
 
-bool LastTokenIsTrailingBackslash(const LineReadState* state) {
+bool LastTokenIsTrailingBackslash(const ReadingState* state) {
   const int last = state->fTokenCount - 1;
   return TextOf(state, last).At(0) == '\\' && state->fTokenPositions[last].fLine ==
                                                   static_cast<uint16_t>(state->fLineIndex);
 }
 
-bool AnyTokenIs(const LineReadState* state, int from, int to, std::string_view word) {
+bool AnyTokenIs(const ReadingState* state, int from, int to, std::string_view word) {
   for (int i = from; i < to; i++) {
     if (TextOf(state, i).Is(word)) return true;
   }
   return false;
 }
 
-bool IsLineOpen(const LineReadState* state) {
+bool IsLineOpen(const ReadingState* state) {
   // Only an open string counts here: a first line of blanks without a line break scans
   // nothing and must stay a blank line rather than swallow the next one.
   if (state->fScan.fComplete == 0 && state->fScan.fTokenId == STRING_TOKEN) return true;
@@ -61,7 +57,7 @@ bool IsLineOpen(const LineReadState* state) {
   return state->fNesting > 0;
 }
 
-bool StartsNewStatement(const LineReadState* state, int k, int depthBefore) {
+bool StartsNewStatement(const ReadingState* state, int k, int depthBefore) {
   const TokenText first = TextOf(state, k);
   if (first.At(0) == '@') return true;
   if (depthBefore <= 0) {
@@ -84,100 +80,71 @@ bool StartsNewStatement(const LineReadState* state, int k, int depthBefore) {
   return IsStatementKeyword(first);
 }
 
-// Moves the physical line at lineStart back into the pending line.
-int HandBack(LineReadState* state, TextBuffer* pending, int lineStart, int k) {
+// Moves the physical line at lineStart back into the pending line, which is always empty
+// here: the reader has just taken from it.
+int HandBack(ReadingState* state, int lineStart, int k) {
   TruncateTokens(state, k);
-  if (pending->fLength != 0 || lineStart < 0 || lineStart > state->fTextLength) {
-    RaiseBadInternalCall(kHandBackCheckLine);
-    return -1;
-  }
-  if (AppendBytes(pending, state->fText.fData + lineStart,
-                  static_cast<size_t>(state->fTextLength - lineStart)) != 0) {
+  if (AppendBytes(&state->fPending, state->fText.fData + lineStart,
+                  state->fText.fLength - static_cast<size_t>(lineStart)) != 0) {
     PyErr_NoMemory();
     return -1;
   }
   TruncateText(&state->fText, static_cast<size_t>(lineStart));
-  state->fTextLength = lineStart;
   state->fScan.fComplete = 1;  // a string opened by the handed-back line is not ours
   return 0;
 }
 
-// Lists the error token of a string that the input ended inside.
-int AppendUnfinishedString(LineReadState* state) {
-  int lineIndex = 0;
-  int column = 0;
-  PyRef token = PyRef::Steal(MakeErrorToken(state, &lineIndex, &column));
-  if (!token) return -1;
-  return AppendToken(state, token.Get(), lineIndex, column);
-}
-
 // Reads the logical line's physical lines. Returns 0 with *open set, or -1.
-int ReadLogicalLine(LineReadState* state, PyObject* readline, TextBuffer* pending,
-                    int64_t* lineNumber, int* atEnd, int* indent, int* open) {
-  if (ReadSourceLine(state, readline, pending, atEnd, *lineNumber) != 0) return -1;
-  if (TokenizePhysicalLine(state, 0, indent) != 0) return -1;
-  ++*lineNumber;
+int ReadPhysicalLines(ReadingState* state, int* open) {
+  if (ReadSourceLine(state) != 0 || TokenizePhysicalLine(state, 0) != 0) return -1;
+  state->fLineNumber++;
   *open = IsLineOpen(state);
-  while (!*atEnd && *open) {
-    const int lineStart = state->fTextLength;
+  while (!state->fAtEnd && *open) {
+    const int lineStart = TextLength(state);
     const int depthBefore = state->fNesting;
     const int k = state->fTokenCount;
-    if (ReadSourceLine(state, readline, pending, atEnd, *lineNumber) != 0) return -1;
-    if (*atEnd) break;  // this read is not counted
+    if (ReadSourceLine(state) != 0) return -1;
+    if (state->fAtEnd) break;  // this read is not counted
     state->fLineIndex++;
-    if (TokenizePhysicalLine(state, lineStart, nullptr) != 0) return -1;
+    if (TokenizePhysicalLine(state, lineStart) != 0) return -1;
     if (state->fTokenCount > k && StartsNewStatement(state, k, depthBefore))
-      return HandBack(state, pending, lineStart, k);  // stays open: the line is incomplete
-    ++*lineNumber;
+      return HandBack(state, lineStart, k);  // stays open: the line is incomplete
+    state->fLineNumber++;
     *open = IsLineOpen(state);
   }
   return 0;
 }
 
-PyObject* FinishLogicalLine(LineReadState* state, int64_t firstLine, int64_t lineNumber,
-                            int indent, int open) {
-  if (state->fTokenCount == 0 ||
-      (state->fParser->fSkipWhitespaceLines && state->fSignificantCount == 0))
-    Py_RETURN_NONE;
-  const int64_t lineCount = lineNumber - firstLine;
-  if (firstLine > INT_MAX || lineCount > INT_MAX) {
-    PyErr_SetString(PyExc_OverflowError, "Line number does not fit in 32 bits");
-    return nullptr;
-  }
-  const bool withText = state->fParser->fIncludeLineText;
-  LineParts parts{indent,
-                  static_cast<int>(firstLine),
-                  static_cast<int>(lineCount),
-                  state->fTokenArray,
-                  state->fTokenPositions,
-                  state->fTokenCount,
-                  state->fSpacesInIndent,
-                  state->fTabsInIndent,
-                  open,
-                  withText ? state->fText.fData : nullptr,
-                  withText ? state->fText.fLength : 0};
-  return CreateLogicalLine(parts);
-}
-
 }  // namespace
 
-PyObject* BuildLogicalLine(LogicalLineParser* parser, PyObject* readline, TextBuffer* pending,
-                           int64_t* lineNumber, int* atEnd, TokenCache* cache,
-                           TokenStorage* storage) {
-  LineReadState state;
-  InitLineReadState(&state, parser, cache, storage);
-  const int64_t firstLine = *lineNumber;
-  int indent = -1;
+int BuildLogicalLine(ReadingState* state, LineParts* parts) {
+  StartLogicalLine(state);
+  const int64_t firstLine = state->fLineNumber;
   int open = 0;
-  PyObject* result = nullptr;
-  if (ReadLogicalLine(&state, readline, pending, lineNumber, atEnd, &indent, &open) == 0) {
-    bool failed = false;
-    if (state.fScan.fStart != -1 && state.fScan.fComplete == 0) {  // input ended inside a string
-      failed = AppendUnfinishedString(&state) != 0;
-      open = 1;
-    }
-    if (!failed) result = FinishLogicalLine(&state, firstLine, *lineNumber, indent, open);
+  if (ReadPhysicalLines(state, &open) != 0) return -1;
+  if (state->fScan.fStart != -1 && state->fScan.fComplete == 0) {  // input ended inside a string
+    if (AppendUnfinishedString(state) != 0) return -1;
+    open = 1;
   }
-  ReleaseLineReadState(&state);
-  return result;
+  if (state->fTokenCount == 0 ||
+      (state->fOptions.fSkipWhitespaceLines && state->fSignificantCount == 0))
+    return 0;
+  const int64_t lineCount = state->fLineNumber - firstLine;
+  if (firstLine > INT_MAX || lineCount > INT_MAX) {
+    PyErr_SetString(PyExc_OverflowError, "Line number does not fit in 32 bits");
+    return -1;
+  }
+  const bool withText = state->fOptions.fIncludeLineText;
+  *parts = LineParts{.fIndentLevel = state->fIndent,
+                     .fFirstLine = static_cast<int>(firstLine),
+                     .fLineCount = static_cast<int>(lineCount),
+                     .fTokens = state->fTokenArray,
+                     .fPositions = state->fTokenPositions,
+                     .fTokenCount = state->fTokenCount,
+                     .fSpacesInIndent = state->fSpacesInIndent,
+                     .fTabsInIndent = state->fTabsInIndent,
+                     .fIncomplete = open,
+                     .fLineText = withText ? state->fText.fData : nullptr,
+                     .fLineTextLength = withText ? state->fText.fLength : 0};
+  return 1;
 }

@@ -1,21 +1,11 @@
 // Logical line builder: reads and tokenizes physical lines until the logical line is complete,
-// handing back a physical line that starts a new statement, then constructs the line.
+// handing back a physical line that starts a new statement.
 #pragma once
 
-#define PY_SSIZE_T_CLEAN
-#include <Python.h>
+#include "assembly/line_parts.h"
+#include "assembly/reading_state.h"
 
-#include <cstdint>
-
-#include "assembly/line_read_state.h"
-#include "assembly/text_buffer.h"
-#include "assembly/token_cache.h"
-#include "module/parser.h"
-
-// Returns a new reference to the next logical line (or to what the create hook returned), a
-// new reference to None when there is nothing to return, or nullptr with an exception set.
-// *lineNumber is the number of the next physical line to read and advances by the lines
-// consumed.
-PyObject* BuildLogicalLine(LogicalLineParser* parser, PyObject* readline, TextBuffer* pending,
-                           int64_t* lineNumber, int* atEnd, TokenCache* cache,
-                           TokenStorage* storage);
+// Reads the next logical line. Returns 1 with its parts filled in (valid until the next call),
+// 0 when it read only lines that give nothing (blank ones, or comments that are skipped), or -1
+// with an exception set. fLineNumber advances by the physical lines consumed.
+int BuildLogicalLine(ReadingState* state, LineParts* parts);

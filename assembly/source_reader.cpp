@@ -7,14 +7,14 @@
 #include <climits>
 #include <cstring>
 
-#include "module/py_ref.h"
+#include "core/py_ref.h"
 
 namespace {
 
 // Appends bytes to the logical line text, refusing a text that its 32-bit offsets cannot
 // address.
-int AcceptText(LineReadState* state, const char* bytes, size_t n) {
-  if (n >= static_cast<size_t>(INT_MAX) - static_cast<size_t>(state->fTextLength)) {
+int AcceptText(ReadingState* state, const char* bytes, size_t n) {
+  if (n >= static_cast<size_t>(INT_MAX) - state->fText.fLength) {
     PyErr_SetString(PyExc_ValueError, "Logical line too long");
     return -1;
   }
@@ -22,30 +22,29 @@ int AcceptText(LineReadState* state, const char* bytes, size_t n) {
     PyErr_NoMemory();
     return -1;
   }
-  state->fTextLength += static_cast<int>(n);
   return 0;
 }
 
 }  // namespace
 
-int ReadSourceLine(LineReadState* state, PyObject* readline, TextBuffer* pending, int* atEnd,
-                   int64_t lineNumber) {
+int ReadSourceLine(ReadingState* state) {
+  TextBuffer* pending = &state->fPending;
   if (pending->fLength > 0) {
     if (AcceptText(state, pending->fData, pending->fLength) != 0) return -1;
     ResetTextBuffer(pending);
     return 0;
   }
-  PyRef line = PyRef::Steal(PyObject_CallNoArgs(readline));
+  PyRef line = PyRef::Steal(PyObject_CallNoArgs(state->fReadline));
   if (!line) return -1;
   char* bytes = nullptr;
   Py_ssize_t size = 0;
   // Anything but bytes (a str included) gets the accessor's TypeError.
   if (PyBytes_AsStringAndSize(line.Get(), &bytes, &size) != 0) return -1;
-  *atEnd = size == 0;
+  state->fAtEnd = size == 0;
   if (size == 0) return 0;
   if (memchr(bytes, '\0', static_cast<size_t>(size))) {
     PyErr_Format(PyExc_ValueError, "Binary data encountered at lineno %lld while tokenizing",
-                 static_cast<long long>(lineNumber));
+                 static_cast<long long>(state->fLineNumber));
     return -1;
   }
   return AcceptText(state, bytes, static_cast<size_t>(size));

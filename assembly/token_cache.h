@@ -7,7 +7,7 @@
 
 #include <cstdint>
 
-#include "tokenizer/token_ids.h"
+#include "core/token_ids.h"
 
 constexpr int kTokenCacheSlots = 4096;      // a power of two
 constexpr Py_ssize_t kCachedTextLimit = 40;  // longer texts are rarely repeated

@@ -1,4 +1,4 @@
-// The parser object and CreateLogicalLineParser.
+// The parser type.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
@@ -6,28 +6,7 @@
 
 #include "module/reading_loop.h"
 
-const char kCreateLogicalLineParserDoc[] =
-    "Create a logical parser object.  Arguments set fields that set \n"
-    "parser's behavior for its lifetime.  Signature is:\n"
-    " def CreateLogicalLineParser(copy_strings = 1, \n"
-    "                  skip_whitespace_lines = 1, remove_comments = 1) \n"
-    " where copy_strings is a boolean which controls whether string \n"
-    "          tokens are copied or if standard common string object is \n"
-    "          used, \n"
-    "       skip_whitespace_lines is a boolean that controls whether \n"
-    "          whitespace lines are skipped, \n"
-    "       removed_comments is a boolean that controls whether all comment \n"
-    "          tokens are removed from returned logical lines. \n"
-    "       include_line_text isa boolean that controls whether to include \n"
-    "          copies of logical line original text as the fLineText \n"
-    "          attribute in the logical line objects";
-
 namespace {
-
-PyMethodDef kParserMethods[] = {
-    {"GetLogicalLineList", GetLogicalLineList, METH_VARARGS, kGetLogicalLineListDoc},
-    {nullptr, nullptr, 0, nullptr},
-};
 
 void ParserDealloc(PyObject* self) { Py_TYPE(self)->tp_free(self); }
 
@@ -54,17 +33,8 @@ PyTypeObject LogicalLineParserType = {
 };
 #pragma GCC diagnostic pop
 
-PyObject* CreateLogicalLineParser(PyObject*, PyObject* args, PyObject* kwargs) {
-  static const char* keywords[] = {"copy_strings", "skip_whitespace_lines", "remove_comments",
-                                   "include_line_text", nullptr};
-  PyObject* copyStrings = Py_True;
-  PyObject* skipWhitespaceLines = Py_True;
-  PyObject* removeComments = Py_True;
-  PyObject* includeLineText = Py_True;
-  if (!PyArg_ParseTupleAndKeywords(args, kwargs, "|OOOO", const_cast<char**>(keywords),
-                                   &copyStrings, &skipWhitespaceLines, &removeComments,
-                                   &includeLineText))
-    return nullptr;
+PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObject* removeComments,
+                    PyObject* includeLineText) {
   LogicalLineParser* parser = PyObject_New(LogicalLineParser, &LogicalLineParserType);
   if (!parser) return nullptr;
   parser->fOperatorTable = &kOperatorTable;

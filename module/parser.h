@@ -17,8 +17,8 @@ struct LogicalLineParser {
 
 extern PyTypeObject LogicalLineParserType;
 
-// Module function CreateLogicalLineParser(copy_strings, skip_whitespace_lines,
-// remove_comments, include_line_text).
-PyObject* CreateLogicalLineParser(PyObject* self, PyObject* args, PyObject* kwargs);
-
-extern const char kCreateLogicalLineParserDoc[];
+// Returns a new parser whose options are the truth values of the four objects, taken in the
+// order skip_whitespace_lines, remove_comments, copy_strings, include_line_text; nullptr with
+// the exception of the first truth test that raises.
+PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObject* removeComments,
+                    PyObject* includeLineText);

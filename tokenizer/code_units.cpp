@@ -65,12 +65,3 @@ bool IsIdentifierChar(const char* p, const char* end) {
   const Py_UCS4 unit = FirstCodeUnit(p, end);
   return Py_UNICODE_ISALPHA(unit) || Py_UNICODE_ISNUMERIC(unit);
 }
-
-PyObject* GetFirstCodeUnit(PyObject*, PyObject* args) {
-  const char* text = nullptr;
-  Py_ssize_t length = 0;
-  if (!PyArg_ParseTuple(args, "s#", &text, &length)) return nullptr;
-  const Py_UCS4 unit = FirstCodeUnit(text, text + length);
-  // A unit in the surrogate range becomes a str holding that lone surrogate.
-  return PyUnicode_FromKindAndData(PyUnicode_4BYTE_KIND, &unit, 1);
-}

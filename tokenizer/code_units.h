@@ -68,6 +68,3 @@ bool IsIdentifierStart(const char* p, const char* end);
 
 // True when the first character of [p, end) may continue a name (p before end).
 bool IsIdentifierChar(const char* p, const char* end);
-
-// Module function _GetFirstCodeUnit(text): the code unit as a one-character str.
-PyObject* GetFirstCodeUnit(PyObject* self, PyObject* args);

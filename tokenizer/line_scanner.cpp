@@ -2,8 +2,8 @@
 // line text, which holds every physical line of the logical line in one buffer.
 #include "tokenizer/line_scanner.h"
 
+#include "core/token_ids.h"
 #include "tokenizer/code_units.h"
-#include "tokenizer/token_ids.h"
 
 namespace {
 

@@ -1,11 +1,14 @@
-// The operator table. "<>" is the one text that is not canonical for its id: it is listed
-// under "!=".
+// The operator table. The rows are written once, in search order; the rows by id are derived
+// from them, so the two orders cannot disagree.
 #include "tokenizer/operator_table.h"
+
+#include "core/token_ids.h"
 
 namespace {
 
 // Rows with the same first byte are contiguous, and every row stands after each row whose
 // text is a proper prefix of its own, so the last row that matches is the longest operator.
+// The first row of an id is its canonical text: "!=" stands before "<>".
 constexpr OperatorEntry kOperatorsByText[] = {
     {29, "!="}, {24, "%"},   {41, "%="},  {19, "&"},  {42, "&="},  {7, "("},    {8, ")"},
     {16, "*"},  {36, "**"},  {47, "**="}, {39, "*="}, {14, "+"},   {37, "+="},  {12, ","},
@@ -15,22 +18,58 @@ constexpr OperatorEntry kOperatorsByText[] = {
     {35, ">>"}, {46, ">>="}, {50, "@"},   {9, "["},   {203, "\\"}, {10, "]"},   {33, "^"},
     {44, "^="}, {25, "`"},   {26, "{"},   {18, "|"},  {43, "|="},  {27, "}"},   {32, "~"},
 };
-
-constexpr OperatorEntry kOperatorsById[] = {
-    {7, "("},    {8, ")"},   {9, "["},    {10, "]"},   {11, ":"},   {12, ","},   {13, ";"},
-    {14, "+"},   {15, "-"},  {16, "*"},   {17, "/"},   {18, "|"},   {19, "&"},   {20, "<"},
-    {21, ">"},   {22, "="},  {23, "."},   {24, "%"},   {25, "`"},   {26, "{"},   {27, "}"},
-    {28, "=="},  {29, "!="}, {30, "<="},  {31, ">="},  {32, "~"},   {33, "^"},   {34, "<<"},
-    {35, ">>"},  {36, "**"}, {37, "+="},  {38, "-="},  {39, "*="},  {40, "/="},  {41, "%="},
-    {42, "&="},  {43, "|="}, {44, "^="},  {45, "<<="}, {46, ">>="}, {47, "**="}, {48, "//"},
-    {49, "//="}, {50, "@"},  {51, "->"},  {52, "..."}, {53, ":="},  {203, "\\"},
-};
-
 constexpr int kByTextCount = sizeof(kOperatorsByText) / sizeof(kOperatorsByText[0]);
-constexpr int kByIdCount = sizeof(kOperatorsById) / sizeof(kOperatorsById[0]);
-static_assert(kByTextCount == 49, "every canonical text plus \"<>\"");
-static_assert(kByIdCount == 48, "one row per operator id");
-static_assert(kByTextCount == kByIdCount + 1, "the tables must list the same operators");
+
+constexpr bool StartsWith(const char* text, const char* prefix) {
+  for (; *prefix; prefix++, text++) {
+    if (*text != *prefix) return false;
+  }
+  return true;
+}
+
+// The two properties that FindOperator relies on, checked row by row.
+constexpr bool SearchOrderHolds() {
+  for (int i = 0; i < kByTextCount; i++) {
+    for (int j = i + 1; j < kByTextCount; j++) {
+      const char* earlier = kOperatorsByText[i].fSpelling;
+      const char* later = kOperatorsByText[j].fSpelling;
+      if (StartsWith(earlier, later)) return false;  // a prefix must come first
+      if (earlier[0] == later[0] && kOperatorsByText[j - 1].fSpelling[0] != later[0])
+        return false;  // a group of one first byte is broken
+    }
+  }
+  return true;
+}
+static_assert(SearchOrderHolds(), "operator rows out of search order");
+
+constexpr bool IsCanonical(int row) {
+  for (int i = 0; i < row; i++) {
+    if (kOperatorsByText[i].fId == kOperatorsByText[row].fId) return false;
+  }
+  return true;
+}
+
+constexpr int CountCanonical() {
+  int n = 0;
+  for (int row = 0; row < kByTextCount; row++) n += IsCanonical(row);
+  return n;
+}
+constexpr int kByIdCount = CountCanonical();
+static_assert(kByIdCount == 48, "one canonical text per operator id");
+
+// One row per operator id, in increasing id.
+struct IdRows {
+  OperatorEntry fRows[kByIdCount];
+  constexpr IdRows() : fRows() {
+    int n = 0;
+    for (int id = 0; id < kTokenIdLimit; id++) {
+      for (int row = 0; row < kByTextCount; row++) {
+        if (kOperatorsByText[row].fId == id && IsCanonical(row)) fRows[n++] = kOperatorsByText[row];
+      }
+    }
+  }
+};
+constexpr IdRows kOperatorsById;
 
 // Where each first byte's group of rows begins, so a lookup skips straight to its group.
 struct GroupIndex {
@@ -42,7 +81,6 @@ struct GroupIndex {
           static_cast<signed char>(row);
   }
 };
-
 constexpr GroupIndex kGroupIndex;
 
 // True when the whole spelling lies within [p, end) and equals its bytes.
@@ -55,8 +93,13 @@ bool SpellingMatches(const char* spelling, const char* p, const char* end) {
 
 }  // namespace
 
-const OperatorTable kOperatorTable = {kOperatorsByText, kByTextCount, kOperatorsById, kByIdCount,
-                                      kGroupIndex.fStart};
+const OperatorTable kOperatorTable = {
+    .fByText = kOperatorsByText,
+    .fByTextCount = kByTextCount,
+    .fById = kOperatorsById.fRows,
+    .fByIdCount = kByIdCount,
+    .fGroupStart = kGroupIndex.fStart,
+};
 
 const OperatorEntry* FindOperator(const OperatorTable* table, const char* p, const char* end) {
   if (p >= end) return nullptr;

@@ -1,4 +1,4 @@
-// Token queries: the kind and text of a stored token, derived again from its text.
+// Token queries: the kind and the shown text of a token, derived again from its text.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN
@@ -8,16 +8,6 @@
 // through its prefix. Returns -1 with an exception set on failure.
 int TokenTypeOfText(PyObject* text, int skip);
 
-// Returns a str for a token: str and None as they are, bytes decoded with replacement.
-PyObject* TokenTextToStr(PyObject* token);
-
-// LogicalLine methods GetTokenType(i, skip_error_prefix=0) and GetTokenString(i, ...).
-PyObject* GetTokenTypeMethod(PyObject* self, PyObject* args, PyObject* kwargs);
-PyObject* GetTokenStringMethod(PyObject* self, PyObject* args, PyObject* kwargs);
-
-// Direct table entries 12 and 13.
-int GetTokenTypeDirect(PyObject* line, int index, int skip);
-int GetStringTokenTypeDirect(PyObject* text, int skip);
-
-extern const char kGetTokenTypeDoc[];
-extern const char kGetTokenStringDoc[];
+// Returns the str shown for a bytes token: its bytes decoded, U+FFFD for malformed sequences.
+// With skip set, an error token is shown without its prefix.
+PyObject* TokenStr(PyObject* token, int skip = 0);

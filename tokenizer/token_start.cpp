@@ -6,8 +6,8 @@
 
 #include <cstddef>
 
+#include "core/token_ids.h"
 #include "tokenizer/code_units.h"
-#include "tokenizer/token_ids.h"
 
 namespace {
 
@@ -70,7 +70,7 @@ int TokenIdForStart(const OperatorTable* table, const char* p, const char* end) 
   const unsigned b = Byte(p);
   // Most tokens are names that no string prefix can begin: decide those at once.
   if (HasClass(b, kNameChar) && !HasClass(b, kAsciiDigit | kPrefixLetter)) return NAME_TOKEN;
-  ScanState scratch{};
+  ScanState scratch = kFreshScan;
   if (ScanStringStart(p, end, &scratch)) return STRING_TOKEN;
   if (IsIdentifierStart(p, end)) return NAME_TOKEN;
   if (IsLineBreak(b)) return NEWLINE_TOKEN;
@@ -79,11 +79,4 @@ int TokenIdForStart(const OperatorTable* table, const char* p, const char* end) 
   if (b == '#') return COMMENT_TOKEN;
   const OperatorEntry* row = FindOperator(table, p, end);
   return row ? row->fId : ERROR_TOKEN;
-}
-
-PyObject* GetIdForTokenStart(PyObject*, PyObject* args) {
-  const char* text = nullptr;
-  Py_ssize_t length = 0;
-  if (!PyArg_ParseTuple(args, "s#", &text, &length)) return nullptr;
-  return PyLong_FromLong(TokenIdForStart(&kOperatorTable, text, text + length));
 }

@@ -2,12 +2,11 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
-#include "module/line_types.h"
+#include "module/constants.h"
 
-#include "module/errors.h"
-#include "module/logical_line.h"
-#include "module/py_ref.h"
-#include "tokenizer/token_ids.h"
+#include "core/py_ref.h"
+#include "core/token_ids.h"
+#include "lines/logical_line.h"
 
 LineTypeRow LineTypeTable[kLineTypeCount] = {
     {"kUnknown", "unknown", nullptr},
@@ -55,10 +54,6 @@ constexpr AttribKind kAttribKinds[] = {
 
 int AddLineTypes(PyObject* dict) {
   for (LineTypeRow& row : LineTypeTable) {
-    if (row.fObject) {  // a second initialisation in the same process
-      RaiseBadInternalCall(kConstantsCheckLine);
-      return -1;
-    }
     row.fObject = PyBytes_FromString(row.fDescription);
     if (!row.fObject) return -1;
     if (PyDict_SetItemString(dict, row.fName, row.fObject) != 0) return -1;

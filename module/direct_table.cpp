@@ -3,17 +3,16 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
-#include "analysis/direct_table.h"
+#include "module/direct_table.h"
 
-#include "analysis/editing.h"
+#include "lines/editing.h"
+#include "lines/line_type.h"
+#include "lines/logical_line.h"
 #include "logicalline_direct.h"
-#include "module/line_types.h"
-#include "module/logical_line.h"
+#include "module/line_surface.h"
 #include "tokenizer/token_queries.h"
 
 namespace {
-
-LogicalLine* AsLine(PyObject* object) { return reinterpret_cast<LogicalLine*>(object); }
 
 PyObject* CreateEmptyLogical() { return reinterpret_cast<PyObject*>(NewLogicalLine()); }
 
@@ -30,47 +29,55 @@ PyObject* GetArgName(PyObject* object, int index) {
     PyErr_SetString(PyExc_ValueError, "Tried to get argument name from a non-function def line");
     return nullptr;
   }
-  if (index < 0 || index >= line->fNameCount) {
+  if (index < 0 || index >= line->fNames.fCount) {
     PyErr_SetString(PyExc_IndexError, "Invalid arg name index");
     return nullptr;
   }
-  return line->fNames[index];
+  return line->fNames.fItems[index];
 }
 
 int GetArgNameCount(PyObject* object) {
   LogicalLine* line = AsLine(object);
-  return line->fType == kFunctionDef ? static_cast<int>(line->fNameCount) : 0;
+  return line->fType == kFunctionDef ? static_cast<int>(line->fNames.fCount) : 0;
 }
 
 int AppendTypeEquivDirect(PyObject* line, PyObject* a, PyObject* b) {
-  return AppendTypeEquivChecked(AsLine(line), a, b);
+  return AppendTypeEquiv(AsLine(line), a, b);
 }
 int AppendArgTypeEquivDirect(PyObject* line, PyObject* a, PyObject* b) {
-  return AppendArgTypeEquivChecked(AsLine(line), a, b);
+  return AppendArgTypeEquiv(AsLine(line), a, b);
 }
 int AppendAttribDirect(PyObject* line, PyObject* object) {
-  return AppendAttribChecked(AsLine(line), object);
+  return AppendAttrib(AsLine(line), object);
 }
 int AppendArgNameDirect(PyObject* line, PyObject* object) {
-  return AppendArgNameChecked(AsLine(line), object);
+  return AppendArgName(AsLine(line), object);
 }
 int AppendBaseClassNameDirect(PyObject* line, PyObject* object) {
-  return AppendBaseClassNameChecked(AsLine(line), object);
+  return AppendBaseClassName(AsLine(line), object);
 }
 
 PyObject* GetNamesDefinedDirect(PyObject* line) { return NamesDefined(AsLine(line)); }
 
-int ClearAppended(PyObject* line) {
-  ClearNames(AsLine(line));
-  ClearTypeEquivs(AsLine(line));
+int ClearAppendedDirect(PyObject* line) {
+  ClearAppended(AsLine(line));
   return 0;
 }
+
+int GetTokenTypeDirect(PyObject* line, int index, int skip) {
+  PyObject* token = TokenAt(AsLine(line), index);
+  return token ? TokenTypeOfText(token, skip) : -1;
+}
+
+int GetStringTokenTypeDirect(PyObject* text, int skip) { return TokenTypeOfText(text, skip); }
 
 // Each row keeps its entry's own signature type from the public header.
 template <typename Signature>
 void* Entry(Signature function) {
   return reinterpret_cast<void*>(function);
 }
+
+}  // namespace
 
 void* const kLogicalLineFunctionTable[] = {
     Entry<LLCreateEmptyLogical>(CreateEmptyLogical),                 // 0
@@ -84,16 +91,9 @@ void* const kLogicalLineFunctionTable[] = {
     Entry<LLAppendArgNameDirect>(AppendArgNameDirect),               // 8
     Entry<LLAppendBaseClassNameDirect>(AppendBaseClassNameDirect),   // 9
     Entry<LLGetNamesDefined>(GetNamesDefinedDirect),                 // 10
-    Entry<LLClearAppended>(ClearAppended),                           // 11
+    Entry<LLClearAppended>(ClearAppendedDirect),                     // 11
     Entry<LLGetTokenTypeDirect>(GetTokenTypeDirect),                 // 12
     Entry<LLGetStringTokenTypeDirect>(GetStringTokenTypeDirect),     // 13
 };
 static_assert(sizeof(kLogicalLineFunctionTable) / sizeof(void*) == LOGICALLINE_TABLE_SIZE,
               "the table has exactly its 14 entries");
-
-}  // namespace
-
-PyObject* GetDirectLogicalLineFunctionTable(PyObject*, PyObject*) {
-  return PyCapsule_New(const_cast<void**>(kLogicalLineFunctionTable), LOGICALLINE_CAPSULE_NAME,
-                       nullptr);
-}

@@ -3,15 +3,16 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
-#include "module/construction.h"
+#include "lines/construction.h"
 
 #include <cstdlib>
 #include <cstring>
 
-#include "analysis/classifier.h"
-#include "module/errors.h"
-#include "module/logical_line.h"
-#include "module/py_ref.h"
+#include "core/errors.h"
+#include "core/py_ref.h"
+#include "lines/classifier.h"
+#include "lines/logical_line.h"
+#include "lines/tokens_tuple.h"
 
 namespace {
 
@@ -23,15 +24,6 @@ bool PartsAreValid(const LineParts& parts) {
   return false;
 }
 
-PyObject* PositionPair(const TokenPosition* positions, int i) {
-  if (!positions) Py_RETURN_NONE;
-  PyRef row = PyRef::Steal(PyLong_FromLong(positions[i].fLine));
-  if (!row) return nullptr;
-  PyRef column = PyRef::Steal(PyLong_FromLong(positions[i].fColumn));
-  if (!column) return nullptr;
-  return PyTuple_Pack(2, row.Get(), column.Get());
-}
-
 PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
   PyRef tokens = PyRef::Steal(PyTuple_New(parts.fTokenCount));
   if (!tokens) return nullptr;
@@ -40,7 +32,7 @@ PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
   for (int i = 0; i < parts.fTokenCount; i++) {
     Py_INCREF(parts.fTokens[i]);
     PyTuple_SET_ITEM(tokens.Get(), i, parts.fTokens[i]);
-    PyObject* pair = PositionPair(parts.fPositions, i);
+    PyObject* pair = PositionTuple(parts.fPositions[i]);
     if (!pair) return nullptr;
     PyTuple_SET_ITEM(positions.Get(), i, pair);
   }
@@ -57,7 +49,7 @@ PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
 int FillStorage(LogicalLine* line, const LineParts& parts) {
   const size_t count = static_cast<size_t>(parts.fTokenCount);
   const size_t tokenBytes = count * sizeof(PyObject*);
-  const size_t positionBytes = parts.fPositions ? count * sizeof(TokenPosition) : 0;
+  const size_t positionBytes = count * sizeof(TokenPosition);
   const size_t textBytes = parts.fLineText ? parts.fLineTextLength + 1 : 0;
   char* block = static_cast<char*>(malloc(tokenBytes + positionBytes + textBytes + 1));
   if (!block) {
@@ -66,14 +58,12 @@ int FillStorage(LogicalLine* line, const LineParts& parts) {
   }
   line->fTokenArray = reinterpret_cast<PyObject**>(block);
   for (size_t i = 0; i < count; i++) {
-    Py_XINCREF(parts.fTokens[i]);
+    Py_INCREF(parts.fTokens[i]);
     line->fTokenArray[i] = parts.fTokens[i];
   }
   line->fTokenCount = parts.fTokenCount;
-  if (parts.fPositions) {
-    line->fTokenPositions = reinterpret_cast<TokenPosition*>(block + tokenBytes);
-    if (count) memcpy(line->fTokenPositions, parts.fPositions, positionBytes);
-  }
+  line->fTokenPositions = reinterpret_cast<TokenPosition*>(block + tokenBytes);
+  if (count) memcpy(line->fTokenPositions, parts.fPositions, positionBytes);
   if (parts.fLineText) {
     line->fLineText = block + tokenBytes + positionBytes;
     memcpy(line->fLineText, parts.fLineText, parts.fLineTextLength);
@@ -95,8 +85,10 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts) {
   line->fIndentLevel = static_cast<int16_t>(parts.fIndentLevel);
   line->fFirstLine = parts.fFirstLine;
   line->fLineCount = static_cast<int16_t>(parts.fLineCount);
-  line->fType = ClassifyLogicalLine(line->fTokenArray, line->fTokenCount, &line->fLocalScopeName);
-  if (PyErr_Occurred()) return nullptr;
+  LineType type = kUnknown;
+  if (ClassifyLogicalLine(line->fTokenArray, line->fTokenCount, &type, &line->fLocalScopeName) != 0)
+    return nullptr;
+  line->fType = type;
   line->fFlags = FlagIf(parts.fSpacesInIndent, kSpacesInIndentFlag) |
                  FlagIf(parts.fTabsInIndent, kTabsInIndentFlag) |
                  FlagIf(parts.fIncomplete, kIncompleteFlag);
@@ -113,13 +105,10 @@ PyObject* CreateLogicalLine(const LineParts& parts) {
   return CreateNativeLogicalLine(parts);
 }
 
-PyObject* SetLogicalCreateFunction(PyObject*, PyObject* args) {
-  PyObject* hook = nullptr;
-  if (!PyArg_ParseTuple(args, "O", &hook)) return nullptr;
+void SetCreateHook(PyObject* hook) {
   // Install before releasing the old hook: its release may run code that installs another.
   Py_INCREF(hook);
   PyObject* old = gCreateHook;
   gCreateHook = hook;
   Py_XDECREF(old);
-  Py_RETURN_NONE;
 }

@@ -5,10 +5,8 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
+// A line whose range or indentation cannot be a logical line's (a copy after SetLineRange).
 constexpr int kConstructionCheckLine = 323;
-constexpr int kHandBackCheckLine = 1966;
-constexpr int kTokenTextCheckLine = 2293;
-constexpr int kConstantsCheckLine = 2484;
 
 // Raises SystemError "logicallinemodule:<line>: bad argument to internal function".
 inline void RaiseBadInternalCall(int line) {

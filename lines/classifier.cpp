@@ -3,15 +3,14 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
-#include "analysis/classifier.h"
+#include "lines/classifier.h"
 
 #include <string_view>
 
-#include "analysis/token_text.h"
-#include "module/line_types.h"
+#include "core/token_ids.h"
 #include "tokenizer/operator_table.h"
-#include "tokenizer/token_ids.h"
 #include "tokenizer/token_start.h"
+#include "tokenizer/token_text.h"
 
 namespace {
 
@@ -43,21 +42,23 @@ const StatementWord* FindStatementWord(const TokenText& text) {
 
 bool IsSkippedLeader(const TokenText& text) { return text.Is("\\") || text.Is("async"); }
 
-// Finds the defined name after the key token of a class or function definition.
-uint8_t ScanDefinedName(PyObject* const* tokens, int key, int count, LineType type,
-                        PyObject** localScopeName) {
+// Finds the defined name after the key token of a class or function definition; a line with
+// no name before its parameter list, base list or colon is no definition.
+int ScanDefinedName(PyObject* const* tokens, int key, int count, LineType* type,
+                    PyObject** localScopeName) {
   for (int i = key + 1; i < count; i++) {
     const TokenText text(tokens[i]);
     const int id = TokenIdForStart(&kOperatorTable, text.fBytes, text.fBytes + text.fLength);
     if (id == NAME_TOKEN && !text.Is("async")) {
       Py_CLEAR(*localScopeName);
       *localScopeName = PyUnicode_DecodeUTF8(text.fBytes, text.fLength, "replace");
-      return *localScopeName ? static_cast<uint8_t>(type) : kClassifyFailed;
+      return *localScopeName ? 0 : -1;
     }
     const unsigned first = text.At(0);
-    if (first == '(' || first == ')' || first == ':') return kUnknown;
+    if (first == '(' || first == ')' || first == ':') break;
   }
-  return kUnknown;
+  *type = kUnknown;
+  return 0;
 }
 
 bool IsStringLiteral(const TokenText& text) {
@@ -69,16 +70,14 @@ bool IsStringLiteral(const TokenText& text) {
 }
 
 // Assignments at bracket depth 0, and lines made only of string literals.
-uint8_t ScanAssignmentOrStrings(PyObject* const* tokens, int count) {
+LineType ScanAssignmentOrStrings(PyObject* const* tokens, int count) {
   int depth = 0;
   bool allStrings = true;
   for (int i = 0; i < count; i++) {
     const TokenText text(tokens[i]);
     if (text.Is("=") && depth == 0) return kAssignment;
     if (text.Is("\\") || IsStringLiteral(text)) continue;
-    const unsigned first = text.At(0);
-    if (first == '(' || first == '[' || first == '{') depth++;
-    if (first == ')' || first == ']' || first == '}') depth--;
+    depth += BracketStep(text.At(0));
     allStrings = false;
   }
   return allStrings ? kStringExpression : kUnknown;
@@ -86,16 +85,20 @@ uint8_t ScanAssignmentOrStrings(PyObject* const* tokens, int count) {
 
 }  // namespace
 
-uint8_t ClassifyLogicalLine(PyObject* const* tokens, int count, PyObject** localScopeName) {
-  if (count < 1) return kBlankLine;
+int ClassifyLogicalLine(PyObject* const* tokens, int count, LineType* type,
+                        PyObject** localScopeName) {
   int key = 0;
   while (key < count && IsSkippedLeader(TokenText(tokens[key]))) key++;
-  if (key == count) return kBlankLine;
+  if (key == count) {  // no tokens, or only continuations and "async"
+    *type = kBlankLine;
+    return 0;
+  }
   const TokenText keyText(tokens[key]);
   if (const StatementWord* row = FindStatementWord(keyText)) {
-    if (row->fType != kClassDef && row->fType != kFunctionDef) return row->fType;
-    return ScanDefinedName(tokens, key, count, row->fType, localScopeName);
+    *type = row->fType;
+    if (row->fType != kClassDef && row->fType != kFunctionDef) return 0;
+    return ScanDefinedName(tokens, key, count, type, localScopeName);
   }
-  if (count == 1 && keyText.At(0) == '#') return kComment;
-  return ScanAssignmentOrStrings(tokens, count);
+  *type = count == 1 && keyText.At(0) == '#' ? kComment : ScanAssignmentOrStrings(tokens, count);
+  return 0;
 }

@@ -23,5 +23,5 @@ void ResetTextBuffer(TextBuffer* buffer);
 // the buffer is unchanged).
 int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n);
 
-// Cuts the text to `length` bytes.
+// Cuts the text to `length` bytes, keeping the storage.
 void TruncateText(TextBuffer* buffer, size_t length);

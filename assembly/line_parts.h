@@ -1,0 +1,34 @@
+// What the reader takes in (the parser's options) and what it hands back for one logical line.
+#pragma once
+
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include <cstddef>
+
+#include "core/token_position.h"
+#include "tokenizer/operator_table.h"
+
+struct ReadOptions {
+  const OperatorTable* fOperatorTable;
+  bool fCopyStrings;          // string tokens keep their own text, else the placeholder
+  bool fSkipWhitespaceLines;  // a line of comments only is not handed back
+  bool fRemoveComments;       // comment tokens are not listed
+  bool fIncludeLineText;      // the parts carry the line's source text
+};
+
+// The parts of one logical line. Everything is borrowed from the reader, valid until it reads
+// the next line; whoever builds a line from them takes its own references and copies.
+struct LineParts {
+  int fIndentLevel;                 // >= 0
+  int fFirstLine;                   // >= 0
+  int fLineCount;                   // >= 1
+  PyObject* const* fTokens;         // fTokenCount bytes objects
+  const TokenPosition* fPositions;  // fTokenCount positions
+  int fTokenCount;
+  int fSpacesInIndent;
+  int fTabsInIndent;
+  int fIncomplete;
+  const char* fLineText;            // NUL-terminated UTF-8, or null
+  size_t fLineTextLength;
+};

@@ -1,0 +1,63 @@
+// ReadingState: everything one reading call keeps. Where physical lines come from, and the
+// working state of the logical line being built, which is reused from one logical line to the
+// next so that a call allocates its arrays once.
+#pragma once
+
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include <cstddef>
+#include <cstdint>
+
+#include "assembly/line_parts.h"
+#include "assembly/token_cache.h"
+#include "core/text_buffer.h"
+#include "core/token_position.h"
+#include "tokenizer/token_start.h"
+
+constexpr int kInlineLineStarts = 8;
+
+struct ReadingState {
+  ReadOptions fOptions;
+  // The source.
+  PyObject* fReadline;   // borrowed from the caller
+  TextBuffer fPending;   // a physical line read but handed back: the next line to read
+  int64_t fLineNumber;   // number of the next physical line to read
+  int fAtEnd;            // 1 once readline returned b""
+  TokenCache* fCache;    // texts shared by the whole call
+  // The logical line being built.
+  TextBuffer fText;      // every physical line read for it, line breaks included
+  ScanState fScan;       // carried from one physical line to the next
+  PyObject** fTokenArray;  // fTokenCount owned references
+  TokenPosition* fTokenPositions;
+  int fTokenCount;
+  size_t fTokenCapacity;
+  int fIndent;            // of the first physical line; -1 until measured
+  int fTabsInIndent;
+  int fSpacesInIndent;
+  int fLineIndex;         // physical line within the logical line, from 0
+  int fNesting;           // open bracket depth of the listed tokens; may go negative
+  int fSignificantCount;  // listed tokens that are not comments
+  int* fLineStarts;       // offset in fText of each physical line 0..fLineIndex
+  size_t fLineStartCapacity;
+  int fInlineLineStarts[kInlineLineStarts];
+};
+
+// Sets up a call's state. Returns 0, or -1 with MemoryError set (nothing to release then).
+int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
+                     int64_t firstLine);
+
+// Releases every reference and block the state holds.
+void ReleaseReadingState(ReadingState* state);
+
+// Empties the working state for the next logical line, keeping its storage.
+void StartLogicalLine(ReadingState* state);
+
+// The length of the logical line's text, which its 32-bit offsets address.
+inline int TextLength(const ReadingState* state) { return static_cast<int>(state->fText.fLength); }
+
+// Records where physical line fLineIndex starts. Returns 0, or -1 with MemoryError set.
+int NoteLineStart(ReadingState* state, int offset);
+
+// Returns the index of the physical line that holds text offset `offset`.
+int LineIndexOfOffset(const ReadingState* state, int offset);

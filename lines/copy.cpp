@@ -1,0 +1,37 @@
+// Copying a line. The copy gets storage of its own for everything the record owns as storage,
+// and new references to the same objects. It is always a native LogicalLine: a create hook
+// makes the host's objects from freshly read source, not copies of lines it already holds.
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include "lines/copy.h"
+
+#include <cstring>
+
+#include "core/py_ref.h"
+#include "lines/construction.h"
+
+PyObject* CopyLogicalLine(LogicalLine* source) {
+  const char* text = source->fLineText;
+  const LineParts parts = {.fIndentLevel = source->fIndentLevel,
+                           .fFirstLine = source->fFirstLine,
+                           .fLineCount = source->fLineCount,
+                           .fTokens = source->fTokenArray,
+                           .fPositions = source->fTokenPositions,
+                           .fTokenCount = source->fTokenCount,
+                           .fSpacesInIndent = (source->fFlags & kSpacesInIndentFlag) != 0,
+                           .fTabsInIndent = (source->fFlags & kTabsInIndentFlag) != 0,
+                           .fIncomplete = (source->fFlags & kIncompleteFlag) != 0,
+                           .fLineText = text,
+                           .fLineTextLength = text ? strlen(text) : 0};
+  PyRef copy = PyRef::Steal(CreateNativeLogicalLine(parts));
+  if (!copy) return nullptr;
+  LogicalLine* line = AsLine(copy.Get());
+  Py_XINCREF(source->fScopeName);
+  line->fScopeName = source->fScopeName;
+  if (CopyObjectList(&line->fNames, &source->fNames) != 0 ||
+      CopyObjectList(&line->fTypeEquivs, &source->fTypeEquivs) != 0 ||
+      CopyObjectList(&line->fArgTypeEquivs, &source->fArgTypeEquivs) != 0)
+    return nullptr;
+  return copy.Release();
+}

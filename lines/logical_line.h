@@ -1,0 +1,52 @@
+// The LogicalLine record: one logical line's tokens, range, indentation, line type, and the
+// annotations that the host adds later.
+#pragma once
+
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include <cstdint>
+
+#include "core/object_list.h"
+#include "core/token_position.h"
+
+enum LineFlag : uint8_t {
+  kParsedFlag = 1,
+  kTabsInIndentFlag = 2,
+  kSpacesInIndentFlag = 4,
+  kIncompleteFlag = 8,
+};
+
+struct LogicalLine {
+  PyObject_HEAD
+  PyObject** fTokenArray;          // fTokenCount owned bytes objects; a heap block that also
+                                   // holds fTokenPositions and fLineText
+  TokenPosition* fTokenPositions;  // fTokenCount positions inside fTokenArray's block
+  int32_t fFirstLine;
+  int32_t fTokenCount;
+  int16_t fIndentLevel;
+  int16_t fLineCount;
+  uint8_t fType;   // a line type value, 0 to 25
+  uint8_t fFlags;  // LineFlag bits
+  PyObject* fScopeName;        // owned, or null
+  ObjectList fNames;           // base classes, argument names or attributes, by fType
+  ObjectList fTypeEquivs;      // pairs, two entries each
+  ObjectList fArgTypeEquivs;   // pairs, two entries each
+  char* fLineText;             // own NUL-terminated copy inside fTokenArray's block, or null
+  PyObject* fTokensTuple;      // cache of fTokens; the tokens never change once set
+  PyObject* fLocalScopeName;   // the defined name on a class or function line, else None
+};
+
+// The type. Its methods and attributes are the Python surface's, set before it is readied.
+extern PyTypeObject LogicalLineType;
+
+inline LogicalLine* AsLine(PyObject* object) { return reinterpret_cast<LogicalLine*>(object); }
+
+// Returns a new record in the fresh state (no tokens, type kUnknown, fLocalScopeName None).
+LogicalLine* NewLogicalLine();
+
+// Releases every appended annotation: the names, then both pair lists.
+void ClearAppended(LogicalLine* line);
+
+// Returns token `index` (borrowed), or nullptr with IndexError "Invalid token index" set.
+PyObject* TokenAt(LogicalLine* line, int index);

@@ -1,0 +1,111 @@
+// The module: its functions, their table, and initialisation. State lives in process-wide
+// variables (the line type constants and the create hook), so the module is initialised once
+// per process.
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include "lines/construction.h"
+#include "lines/logical_line.h"
+#include "logicalline_direct.h"
+#include "module/constants.h"
+#include "module/direct_table.h"
+#include "module/line_surface.h"
+#include "module/method_cast.h"
+#include "module/parser.h"
+#include "tokenizer/code_units.h"
+#include "tokenizer/operator_table.h"
+#include "tokenizer/token_start.h"
+
+namespace {
+
+PyDoc_STRVAR(kCreateLogicalLineParserDoc,
+             "Create a logical parser object.  Arguments set fields that set \n"
+             "parser's behavior for its lifetime.  Signature is:\n"
+             " def CreateLogicalLineParser(copy_strings = 1, \n"
+             "                  skip_whitespace_lines = 1, remove_comments = 1) \n"
+             " where copy_strings is a boolean which controls whether string \n"
+             "          tokens are copied or if standard common string object is \n"
+             "          used, \n"
+             "       skip_whitespace_lines is a boolean that controls whether \n"
+             "          whitespace lines are skipped, \n"
+             "       removed_comments is a boolean that controls whether all comment \n"
+             "          tokens are removed from returned logical lines. \n"
+             "       include_line_text isa boolean that controls whether to include \n"
+             "          copies of logical line original text as the fLineText \n"
+             "          attribute in the logical line objects");
+PyObject* CreateLogicalLineParser(PyObject*, PyObject* args, PyObject* kwargs) {
+  static const char* keywords[] = {"copy_strings", "skip_whitespace_lines", "remove_comments",
+                                   "include_line_text", nullptr};
+  PyObject* copyStrings = Py_True;
+  PyObject* skipWhitespaceLines = Py_True;
+  PyObject* removeComments = Py_True;
+  PyObject* includeLineText = Py_True;
+  if (!PyArg_ParseTupleAndKeywords(args, kwargs, "|OOOO", const_cast<char**>(keywords),
+                                   &copyStrings, &skipWhitespaceLines, &removeComments,
+                                   &includeLineText))
+    return nullptr;
+  return NewParser(copyStrings, skipWhitespaceLines, removeComments, includeLineText);
+}
+
+PyDoc_STRVAR(kGetDirectLogicalLineFunctionTableDoc,
+             "Return direct C callable function table for logical line");
+PyObject* GetDirectLogicalLineFunctionTable(PyObject*, PyObject*) {
+  return PyCapsule_New(const_cast<void**>(kLogicalLineFunctionTable), LOGICALLINE_CAPSULE_NAME,
+                       nullptr);
+}
+
+PyDoc_STRVAR(kGetIdForTokenStartDoc,
+             "Get token id for start of string; does not verify that token is complete or valid");
+PyObject* GetIdForTokenStart(PyObject*, PyObject* args) {
+  const char* text = nullptr;
+  Py_ssize_t length = 0;
+  if (!PyArg_ParseTuple(args, "s#", &text, &length)) return nullptr;
+  return PyLong_FromLong(TokenIdForStart(&kOperatorTable, text, text + length));
+}
+
+PyObject* GetFirstCodeUnit(PyObject*, PyObject* args) {
+  const char* text = nullptr;
+  Py_ssize_t length = 0;
+  if (!PyArg_ParseTuple(args, "s#", &text, &length)) return nullptr;
+  const Py_UCS4 unit = FirstCodeUnit(text, text + length);
+  // A unit in the surrogate range becomes a str holding that lone surrogate.
+  return PyUnicode_FromKindAndData(PyUnicode_4BYTE_KIND, &unit, 1);
+}
+
+PyObject* SetLogicalCreateFunction(PyObject*, PyObject* args) {
+  PyObject* hook = nullptr;
+  if (!PyArg_ParseTuple(args, "O", &hook)) return nullptr;
+  SetCreateHook(hook);
+  Py_RETURN_NONE;
+}
+
+PyMethodDef kModuleFunctions[] = {
+    {"CreateLogicalLineParser", AsMethod(CreateLogicalLineParser), METH_VARARGS | METH_KEYWORDS,
+     kCreateLogicalLineParserDoc},
+    {"GetDirectLogicalLineFunctionTable", GetDirectLogicalLineFunctionTable, METH_VARARGS,
+     kGetDirectLogicalLineFunctionTableDoc},
+    {"GetIdForTokenStart", GetIdForTokenStart, METH_VARARGS, kGetIdForTokenStartDoc},
+    {"_GetFirstCodeUnit", GetFirstCodeUnit, METH_VARARGS, nullptr},
+    {"SetLogicalCreateFunction", SetLogicalCreateFunction, METH_VARARGS, nullptr},
+    {nullptr, nullptr, 0, nullptr},
+};
+
+PyModuleDef kModuleDef = {
+    PyModuleDef_HEAD_INIT, "logicalline", nullptr, -1, kModuleFunctions,
+    nullptr, nullptr, nullptr, nullptr,
+};
+
+}  // namespace
+
+PyMODINIT_FUNC PyInit_logicalline() {
+  LogicalLineType.tp_methods = kLineMethods;
+  LogicalLineType.tp_getset = kLineAttributes;
+  if (PyType_Ready(&LogicalLineType) < 0 || PyType_Ready(&LogicalLineParserType) < 0)
+    Py_FatalError("can't initialize logicalline module.");
+  PyObject* module = PyModule_Create2(&kModuleDef, 1013);
+  if (!module || PyErr_Occurred()) Py_FatalError("can't initialize logicalline module.");
+  PyObject* dict = PyModule_GetDict(module);
+  if (PyErr_Occurred() || AddModuleConstants(dict) != 0)
+    Py_FatalError("can't initialize logicalline module.");
+  return module;
+}
