@@ -61,10 +61,14 @@ def _Wrap(address, result, parameters):
     return function
 
 
+def TableAddress(capsule):
+    """The address of the table that a capsule holds."""
+    return _GetPointer(capsule, b"kLogicalLineFunctionTable")
+
+
 def LoadTable():
     """Returns a namespace of the 14 entries, callable as direct.GetArgName(line, 0)."""
-    capsule = logicalline.GetDirectLogicalLineFunctionTable()
-    pointer = _GetPointer(capsule, b"kLogicalLineFunctionTable")
+    pointer = TableAddress(logicalline.GetDirectLogicalLineFunctionTable())
     addresses = (_Address * len(_SIGNATURES)).from_address(pointer)
     table = type("DirectTable", (), {})()
     for (name, result, parameters), address in zip(_SIGNATURES, addresses):

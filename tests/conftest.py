@@ -3,8 +3,7 @@
 OPTIONS = [
     ("--exhaustive", "compare token starts on every 3-byte input (about a minute)"),
     ("--full-stdlib", "check every standard library file against the model and tokenize"),
-    ("--leaks", "repeat every operation and check that nothing leaks"),
-    ("--huge", "run the hostile input cases that need gigabytes of memory"),
+    ("--huge", "run the cases that need gigabytes of memory"),
 ]
 
 

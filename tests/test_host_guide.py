@@ -8,7 +8,6 @@ from test_type_stub import run_mypy
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 GUIDE = ROOT / "docs" / "host_guide.md"
-NATIVE_SOURCE = ROOT / "examples" / "native_host" / "native_host.c"
 
 
 def blocks(language):
@@ -17,25 +16,16 @@ def blocks(language):
 
 def test_sessions(monkeypatch):
     monkeypatch.chdir(ROOT)  # the guide opens a file of this repository by its relative path
-    result = doctest.testfile(str(GUIDE), module_relative=False, verbose=False,
-                              optionflags=doctest.ELLIPSIS)
+    result = doctest.testfile(str(GUIDE), module_relative=False, optionflags=doctest.ELLIPSIS)
     assert result.attempted > 40 and result.failed == 0
 
 
-def test_typed_snippets(tmp_path):
-    snippets = [code for code in blocks("python") if ">>>" not in code]
-    assert snippets
-    for number, code in enumerate(snippets):
+def test_typed_snippets_and_c_excerpts(tmp_path):
+    for number, code in enumerate(code for code in blocks("python") if ">>>" not in code):
         path = tmp_path / f"snippet_{number}.py"
         path.write_text(code)
         result = run_mypy(path)
         assert result.returncode == 0, result.stdout + result.stderr
         exec(compile(code, str(path), "exec"), {"__name__": "snippet"})
-
-
-def test_c_excerpts_are_quoted_from_the_native_example():
-    source = NATIVE_SOURCE.read_text()
-    excerpts = blocks("c")
-    assert len(excerpts) >= 2
-    for excerpt in excerpts:
-        assert excerpt in source, excerpt
+    source = (ROOT / "examples" / "native_host" / "native_host.c").read_text()
+    assert len(blocks("c")) >= 2 and all(excerpt in source for excerpt in blocks("c"))

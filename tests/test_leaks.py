@@ -1,23 +1,19 @@
-"""Leak checks, run with --leaks: every public operation, error paths included, is repeated and
-must leave references and memory where they were. Exact on a debug interpreter (its reference
-total; fuzz/leaks_debug.sh); everywhere the interpreter's block count, the C heap's bytes in use
+"""Leak checks: every public operation, error paths included, is repeated and must leave
+references and memory where they were. Exact on a debug interpreter (its reference total;
+fuzz/leaks_debug.sh); everywhere the interpreter's block count, the C heap's bytes in use
 (glibc's mallinfo2) and the reference counts of the objects that the operations store."""
-
 import copy
 import ctypes
 import gc
 import io
 import itertools
-import os
-import subprocess
 import sys
 
 import pytest
 
 import logicalline
-
-sys.path.insert(0, os.path.join(os.path.dirname(__file__), "..", "fuzz"))
-import direct_table  # noqa: E402
+from test_direct_table import DIRECT
+from test_model_agreement import run_isolated
 
 ROUNDS = 200
 SOURCE = (b"@deco\nclass C(Base):\n    def f(self, a,\n          b=')'):\n"
@@ -25,8 +21,7 @@ SOURCE = (b"@deco\nclass C(Base):\n    def f(self, a,\n          b=')'):\n"
           b"x = f(1,\nif y: pass\ncaf\xe9 = '\xff' <> $ \t\n# only a comment\n   \n"
           b"import os, sys\nfrom a import (b,\n    c)\ns = 'open\n")
 STORED = ["name", ("a", "info"), b"raw"]
-OPTIONS = ("copy_strings", "skip_whitespace_lines", "remove_comments", "include_line_text")
-DIRECT = direct_table.LoadTable()
+UNTRUTHFUL = type("Untruthful", (), {"__bool__": lambda self: 1 / 0})()
 
 
 class Heap(ctypes.Structure):  # glibc's struct mallinfo2
@@ -34,18 +29,13 @@ class Heap(ctypes.Structure):  # glibc's struct mallinfo2
                 "fsmblks uordblks fordblks keepcost".split()]
 
 
-def heap_in_use():
-    """Bytes the C heap has handed out (0 under an ASan runtime, which keeps no such count)."""
-    mallinfo2 = ctypes.CDLL(None).mallinfo2
-    mallinfo2.restype = Heap
-    heap = mallinfo2()
-    return heap.uordblks + heap.hblkhd
-
-
 def usage():
     gc.collect()
-    return [getattr(sys, "gettotalrefcount", int)(), sys.getallocatedblocks(), heap_in_use(),
-            *map(sys.getrefcount, STORED)]
+    mallinfo2 = ctypes.CDLL(None).mallinfo2
+    mallinfo2.restype = Heap
+    heap = mallinfo2()  # all 0 under an ASan runtime, which keeps no such count
+    return [getattr(sys, "gettotalrefcount", int)(), sys.getallocatedblocks(),
+            heap.uordblks + heap.hblkhd, *map(sys.getrefcount, STORED)]
 
 
 def assert_no_growth(operation):
@@ -64,15 +54,9 @@ def assert_no_growth(operation):
     raise AssertionError(f"references, blocks, heap bytes, stored objects grew: {growth}")
 
 
-@pytest.fixture(autouse=True)
-def opt_in(request):
-    if not request.config.getoption("--leaks"):
-        pytest.skip("leak checks run with --leaks")
-
-
-def read(source=SOURCE, *limits, **options):
-    parser = logicalline.CreateLogicalLineParser(**options)
-    return parser.GetLogicalLineList(io.BytesIO(source).readline, *limits)
+def read(source=SOURCE, first_line=0, line_count=-1, *options):
+    parser = logicalline.CreateLogicalLineParser(*options)
+    return parser.GetLogicalLineList(io.BytesIO(source).readline, first_line, line_count)
 
 
 def attempt(call, *args, **kwargs):
@@ -83,18 +67,12 @@ def attempt(call, *args, **kwargs):
         pass
 
 
-UNTRUTHFUL = type("Untruthful", (), {"__bool__": lambda self: 1 / 0})()
-
-
-def parse_with_every_option_set():
+def parsing():
     for flags in itertools.product((0, 1), repeat=4):
-        for line in read(**dict(zip(OPTIONS, flags))):
+        for line in read(SOURCE, 0, -1, *flags):
             for name in dir(line):
                 if name.startswith("f"):
                     attempt(getattr, line, name)  # fLineText of invalid UTF-8 raises
-
-
-def parse_failures():
     parser = logicalline.CreateLogicalLineParser()
     pending = [b"x = (1,\n"]
     attempt(parser.GetLogicalLineList, lambda: pending.pop() if pending else 1 / 0)
@@ -102,8 +80,8 @@ def parse_failures():
         attempt(parser.GetLogicalLineList, lambda: bad)
     for args in ((5,), (print, "x"), (io.BytesIO(b"y\x00\n").readline,)):
         attempt(parser.GetLogicalLineList, *args)
-    for limits in ((2**31 - 2,), (-5,), (3, 4), (0, 0)):
-        attempt(read, SOURCE, *limits)
+    for window in ((2**31 - 2,), (-5,), (3, 4), (0, 0)):
+        attempt(read, SOURCE, *window)
     attempt(logicalline.CreateLogicalLineParser, UNTRUTHFUL)
 
 
@@ -143,14 +121,13 @@ def direct_entries():
         attempt(DIRECT.GetStringTokenTypeDirect, text, 1)  # "\udc80": UnicodeEncodeError
 
 
-@pytest.mark.parametrize("operation", [parse_with_every_option_set, parse_failures, methods,
-                                       direct_entries])
+@pytest.mark.parametrize("operation", [parsing, methods, direct_entries])
 def test_operation_leaks_nothing(operation):
     assert_no_growth(operation)
 
 
 def hooks():
-    """Runs in a subprocess: a create hook stays installed until the process ends."""
+    """Runs in a fresh interpreter: a create hook stays installed until the process ends."""
     kinds = itertools.cycle(range(5))
 
     def hook(*parts):
@@ -168,7 +145,5 @@ def hooks():
 
 
 def test_create_hook_paths_leak_nothing():
-    code = "import sys; sys.path.insert(0, %r); import test_leaks; test_leaks.hooks()"
-    done = subprocess.run([sys.executable, "-c", code % os.path.dirname(__file__)],
-                          capture_output=True, text=True, timeout=300)
+    done = run_isolated("import test_leaks; test_leaks.hooks()")
     assert done.returncode == 0, done.stderr

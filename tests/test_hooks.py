@@ -1,0 +1,66 @@
+"""The create hook. It stays for the life of the process, so each script runs in a fresh one."""
+import pytest
+
+from test_model_agreement import run_isolated
+
+PRELUDE = r'''
+import io, logicalline
+def read(source, *args, **options):
+    parser = logicalline.CreateLogicalLineParser(**options)
+    return parser.GetLogicalLineList(io.BytesIO(source).readline, *args)
+def outcome(source, *args, **options):
+    try:
+        return read(source, *args, **options)
+    except Exception as e:
+        return type(e).__name__
+'''
+SCRIPTS = {"raw parts": r'''
+plain = read(b"def f(a):\n")[0]
+plain.AppendArgName("a")
+calls = []
+logicalline.SetLogicalCreateFunction(lambda *parts: calls.append(parts) or len(calls))
+assert read(b"\tf(1,\n", 5) == [1]
+assert calls == [(8, 5, 1, (b"f", b"(", b"1", b","), ((0, 1), (0, 2), (0, 3), (0, 4)),
+                  0, 1, 1, "\tf(1,\n")], calls
+copied = plain.Copy()  # a copy bypasses the hook
+assert type(copied) is logicalline.LogicalLineType and copied.fArgNames == ("a",)
+logicalline.SetLogicalCreateFunction(lambda *parts: [parts[0], parts[8]])
+assert read(b" " * 40000 + b"x\n", include_line_text=False) == [[40000, None]]
+''', "results stand in": r'''
+source = b"def f(a,\n      b):\n\tf(1,\ndef g(): pass\n"
+odd = [None, 7, (), type, b"\xff"]
+logicalline.SetLogicalCreateFunction(lambda *parts: odd.pop(0))
+assert read(b"a\nb\nc\nd\ne\n") == [7, (), type, b"\xff"]
+marker = object()
+assert logicalline.SetLogicalCreateFunction(lambda *parts: marker) is None
+assert read(source) == [marker] * 3
+''', "failures": r'''
+calls = []
+def hook(*parts):
+    calls.append(parts)
+    return parts if len(calls) != 2 else {}["refused"]
+logicalline.SetLogicalCreateFunction(hook)
+assert outcome(b"x\ny\nz\n") == "KeyError"
+assert outcome(b"x = '\xff'\n") == "UnicodeDecodeError" and len(calls) == 2
+assert len(read(b"x = '\xff'\n", include_line_text=False)) == 1
+logicalline.SetLogicalCreateFunction(42)
+assert read(b"\n  \n") == []  # nothing to construct
+assert outcome(b"x = 1\n") == "TypeError"
+''', "hooks that read or replace themselves": r'''
+def nesting(*parts):
+    return read(parts[8].encode(), parts[1] + 1) if parts[1] < 2 else parts[1]
+logicalline.SetLogicalCreateFunction(nesting)
+assert read(b"a\nb\nc\n") == [[[2]], [2], 2]
+def replacing(*parts):
+    logicalline.SetLogicalCreateFunction(lambda *parts: "second")  # drops the running hook
+    return "first"
+logicalline.SetLogicalCreateFunction(replacing)
+del replacing
+assert read(b"a\nb\n") == ["first", "second"]
+'''}
+
+
+@pytest.mark.parametrize("name", SCRIPTS)
+def test_create_hook(name):
+    done = run_isolated(PRELUDE + SCRIPTS[name])
+    assert done.returncode == 0, done.stderr

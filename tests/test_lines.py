@@ -1,0 +1,157 @@
+"""What a host does with its lines: annotate them, copy them, read them back."""
+import copy
+import sys
+
+import pytest
+
+import logicalline
+from test_model_agreement import read
+
+REFUSALS = {
+    "AppendAttrib": "Cannot append attrib name type to a class or function def line",
+    "AppendArgName": "Cannot append arg name to a non-function def line",
+    "AppendBaseClassName": "Cannot append base class name to a non-class def line",
+    "AppendArgTypeEquiv": "Cannot append arg name type equiv to a non-function def line",
+    "AppendTypeEquiv": None,
+}
+ANY_LINE = {"AppendAttrib", "AppendTypeEquiv"}
+
+
+def line_of(source, **options):
+    return read(source, skip_whitespace_lines=False, remove_comments=False, **options)[0]
+
+
+@pytest.mark.parametrize("source, accepted", [
+    (b"class C(B): pass\n", {"AppendBaseClassName", "AppendTypeEquiv"}),
+    (b"def f(a): pass\n", {"AppendArgName", "AppendTypeEquiv", "AppendArgTypeEquiv"}),
+    (b"def (a): pass\n", ANY_LINE), (b"from a import b\n", ANY_LINE), (b"# note\n", ANY_LINE),
+])
+def test_append_by_line_type(source, accepted):
+    for method, message in REFUSALS.items():
+        line, obj = line_of(source), object()
+        args, before = [obj] * (2 if method.endswith("Equiv") else 1), sys.getrefcount(obj)
+        pytest.raises(TypeError, getattr(line, method))  # argument errors come first
+        if method in accepted:
+            assert getattr(line, method)(*args) is None
+            assert sys.getrefcount(obj) == before + len(args)
+        else:
+            with pytest.raises(ValueError, match=f"^{message}$"):
+                getattr(line, method)(*args)
+            assert sys.getrefcount(obj) == before
+
+
+def test_lists_keep_order_and_identity_and_release_their_objects():
+    line = line_of(b"def f(a): pass\n")
+    names = [object(), ("a", "b"), None, "x", "x"] + [object() for _ in range(6)]
+    pairs = [(object(), object()) for _ in range(7)]
+    before = [sys.getrefcount(o) for o in (names[0], pairs[0][0])]
+    for name in names:
+        line.AppendArgName(name)
+    for a, b in pairs:
+        line.AppendArgTypeEquiv(a, b)
+        line.AppendTypeEquiv(b, a)
+    assert line.fArgNames == tuple(names) and line.fArgTypeEquivs == tuple(pairs)
+    assert line.fTypeEquivs == tuple((b, a) for a, b in pairs)
+    assert line.fBaseClassNames == line.fImportRefs == () and line.fNamesDefined == ("f",)
+    del line
+    assert [sys.getrefcount(o) for o in (names[0], pairs[0][0])] == before
+    entries = [("os", object()), "path", (), ("sys",)] * 3
+    klass, imports = line_of(b"class C(B): pass\n"), line_of(b"from a import b\n")
+    for entry in entries:
+        klass.AppendBaseClassName(entry)
+        imports.AppendAttrib(entry)
+    assert klass.fBaseClassNames == imports.fImportRefs == tuple(entries)
+    assert klass.fImportRefs == imports.fBaseClassNames == imports.fArgNames == ()
+    assert imports.fNamesDefined == ("os", "path", (), "sys") * 3
+
+
+def test_setters():
+    line, first, second = line_of(b"\tx = (1,\n"), object(), object()  # tabs, ended open
+    for start, count, read_back in [(5, 0, (5, 0)), (-1, 3, (-1, 3)), (1, 70000, (1, 4464)),
+                                    (1, 40000, (1, -25536))]:
+        assert line.SetLineRange(start, count) is None
+        assert (line.fFirstLine, line.fLineCount) == read_back
+    pytest.raises(OverflowError, line.SetLineRange, 2 ** 40, 1)
+    for value, parsed in [("x", True), (0, False), ([1], True), ([], False), (None, False)]:
+        line.SetParsed(value)
+        assert line.fParsed is parsed
+    line.SetParsed(1)
+    pytest.raises(ZeroDivisionError, line.SetParsed, type("F", (), {"__bool__": lambda s: 1 / 0})())
+    assert line.fParsed is True  # a failing truth test keeps the flag, and no other flag moves
+    assert (line.fTabsInIndent, line.fSpacesInIndent, line.fIncomplete) == (True, False, True)
+    base = sys.getrefcount(first), sys.getrefcount(second)
+    line.SetScopeName(first)
+    line.SetScopeName(second)
+    assert line.fScopeName is second and sys.getrefcount(first) == base[0]
+    line.SetScopeName(None)
+    assert line.fScopeName is None and sys.getrefcount(second) == base[1]
+
+
+def annotated_def():
+    line, names = line_of(b"def f(a, b, c):\n"), [object(), ("b", "b2"), object()]
+    for name in names:
+        line.AppendArgName(name)
+    line.AppendTypeEquiv("T", object())
+    line.AppendArgTypeEquiv(object(), "U")
+    line.SetScopeName(object())
+    return line, names
+
+
+@pytest.mark.parametrize("make_copy", [
+    lambda line: line.Copy(), lambda line: line.Copy(1, 2, 3),
+    lambda line: line.__deepcopy__({}), lambda line: copy.deepcopy([line])[0],
+])
+def test_copy_shares_objects_and_owns_storage(make_copy):
+    line, names = annotated_def()
+    dup = make_copy(line)
+    assert type(dup) is logicalline.LogicalLineType and dup is not line
+    assert dup.fType is logicalline.kFunctionDef and dup.fLocalScopeName == "f"
+    assert dup.fArgNames == tuple(names) and dup.fScopeName is line.fScopeName
+    assert (dup.fTypeEquivs, dup.fArgTypeEquivs) == (line.fTypeEquivs, line.fArgTypeEquivs)
+    extra = [object() for _ in range(5)]  # appends past the copied count must not overrun
+    for e in extra:
+        dup.AppendArgName(e)
+        dup.AppendTypeEquiv(e, e)
+    line.AppendArgTypeEquiv("V", "W")
+    assert line.fArgNames == tuple(names) and len(line.fTypeEquivs) == 1
+    assert dup.fArgNames == tuple(names + extra) and len(dup.fTypeEquivs) == 6
+    assert len(dup.fArgTypeEquivs) == 1
+
+
+def test_copy_carries_tokens_text_and_flags_but_not_parsed():
+    line = line_of(b"\tx = (1,\n  '\xc3\xa9'\n")
+    line.SetParsed(True)
+    dup = line.Copy()
+    assert dup.fTokens == line.fTokens and dup.GetTokenType(5) == 3
+    assert dup.fLineText == line.fLineText == "\tx = (1,\n  '\u00e9'\n"
+    assert (dup.fFirstLine, dup.fLineCount, dup.fIndentLevel) == (0, 2, 8)
+    assert (dup.fTabsInIndent, dup.fSpacesInIndent, dup.fIncomplete) == (True, False, True)
+    assert dup.fParsed is False and line.fParsed is True
+    assert line_of(b"  y\n").Copy().fSpacesInIndent is True
+    assert line_of(b"x = 1\n", include_line_text=False).Copy().fLineText is None
+    pytest.raises(TypeError, line.Copy, memo={})
+
+
+@pytest.mark.parametrize("first, count", [(0, 0), (-1, 3), (5, -2), (0, 65536), (0, 40000)])
+def test_bad_range_is_refused_and_copies_release_their_references(first, count):
+    line, names = annotated_def()
+    before = sys.getrefcount(names[0]), sys.getrefcount(line.fScopeName)
+    line.SetLineRange(first, count)
+    pytest.raises(SystemError, line.Copy)
+    assert line.fArgNames == tuple(names) and line.fFirstLine == first
+    line.SetLineRange(7, 3)
+    for _ in range(100):
+        dup = line.Copy()
+    assert (dup.fFirstLine, dup.fLineCount) == (7, 3)
+    del dup
+    assert (sys.getrefcount(names[0]), sys.getrefcount(line.fScopeName)) == before
+
+
+def test_lines_are_read_only_and_only_the_module_makes_them():
+    line, parser = line_of(b"x = (1,\n     2)\n"), logicalline.CreateLogicalLineParser()
+    assert line.fTokens is line.fTokens and line.fTokens[5] == ("2", (1, 5))
+    for name in [n for n in dir(line) if n[0] == "f"] + ["fNewAttribute"]:
+        pytest.raises(AttributeError, setattr, line, name, 1)
+    for make in (lambda: object.__new__(type(line)), lambda: type(parser)(),
+                 lambda: copy.copy(line), lambda: type("Sub", (type(line),), {})):
+        pytest.raises(TypeError, make)

@@ -1,0 +1,173 @@
+"""Reading source into logical lines: token cutting, joining and hand-back, positions,
+indentation, line breaks, windows and limits. Every read is checked against the model too."""
+import pytest
+
+import logicalline
+from test_model_agreement import read
+
+KEEP = {"skip_whitespace_lines": False, "remove_comments": False}
+
+
+def texts(line):
+    return [text for text, _ in line.fTokens]
+
+
+@pytest.mark.parametrize("source, tokens", [
+    (b"a<>b x->y a:=1\n", ["a", "!=", "b", "x", "->", "y", "a", ":=", "1"]),
+    (b"0x1F 1e-5 1_000 0x_FF 1.2.3 5j 10L 0x1e+5\n",
+     ["0x1F", "1e-5", "1_000", "0x_FF", "1.2.3", "5j", "10L", "0x1e+5"]),
+    (b"rb'x' bu'x' Rb'' fR'y'\n", ["rb'x'", "bu", "'x'", "Rb''", "fR'y'"]),
+    ("été x² a\U0001F600\n".encode(), ["été", "x²", "a", "<errortoken> \U0001F600"]),
+    (b"\x0c\x0bx $ ? !\n", ["x", "<errortoken> $", "<errortoken> ?", "<errortoken> !"]),
+    (b"caf\xe9 = '\xff\xfe' # \xc3\n", ["caf", "<errortoken> \ufffd", "=", "'\ufffd\ufffd'",
+                                        "# \ufffd\n"]),
+    (b'"""""""\n', ['""""""', '<errortoken> "']),
+    (b"'a\\'b' '\\\\' \"\"\n", ["'a\\'b'", "'\\\\'", '""']),      # escaped and escaping backslashes
+    (b"x = '''a\\'''\n'''\n", ["x", "=", "'''a\\'''\n'''"]),     # an escaped quote closes nothing
+    (b"'abc\\\ndef'\n", ["'abc\\\ndef'"]),                       # backslash-newline inside a string
+    (b"s = 'x\\\ny\n", ["s", "=", "<errortoken> 'x\\\ny"]),
+    (b"x = 1 + '''abc\ndef\n", ["x", "=", "1", "+", "<errortoken> '''abc\ndef\n"]),
+    (b"x\r\ny\rz\n", ["x", "y", "z"]),                          # lone CR ends no physical line
+])
+def test_tokens_are_cut_and_listed(source, tokens):
+    assert [text for line in read(source, **KEEP) for text in texts(line)] == tokens
+
+
+JOINED, HANDED_BACK = [(0, 2, 0)], [(0, 1, 1), (1, 1, 0)]
+
+
+@pytest.mark.parametrize("source, ranges", [  # (first line, line count, incomplete) per line
+    *[(source, JOINED) for source in [
+        b"x = (1,\n     2)\n", b"y = 1 \\\n  + 2\n", b"s = '''a\n  z'''\n",
+        b"f(a,\nprint, with, Def, if_)\n", b"x = [a\nfor a in b]\n", b"x = (a if b\nelse c)\n",
+        b"x = (a\nif b else c)\n", b"x = [a for a in b\nif a]\n",
+        b"x = (" + b"1," * 23 + b"1\nelse)\n",  # 50 tokens before the "else"
+        b"x = (" + b"1," * 22 + b"\nif a)\n",   # 50 tokens with the "if" line
+        b"x = 1 \\\nfor\n", b"x = a \\\nif b\n", b"x = a \\\nelse\n", b"x = \\\nimport y\n"]],
+    *[(source, HANDED_BACK) for source in [
+        b"f(a,\ndef g(): pass\n", b"x = (1,\n@dec\n", b"f(a,\nexec)\n", b"x = (a,\nelse c)\n",
+        b"x = (a,\nif b)\n", b"x = 1 + \\\n@dec\n", b"(a, \\\nreturn)\n",
+        b"x = (" + b"1," * 23 + b"\nelse)\n",      # 49 tokens before the "else"
+        b"x = (" + b"1," * 21 + b"1\nif a)\n"]],   # 49 tokens with the "if" line
+    (b"x = (1,\n\n# c\n 2)\ny = 2\n", [(0, 4, 0), (4, 1, 0)]),
+    (b"f(a", [(0, 1, 1)]),                                     # input ends inside brackets
+    (b"x = 1 + '''abc\ndef\n", [(0, 2, 1)]),                   # input ends inside a string
+    (b")\nx = 1 \\\n", [(0, 1, 0), (1, 1, 1)]),                # negative depth is not open
+    (b"f(a,\ndef g(b,\n c): pass\n", [(0, 1, 1), (1, 2, 0)]),
+    (b"a = (1,\ndef f(): '''x\ny'''\n", [(0, 1, 1), (1, 2, 0)]),  # the next line's string
+    (b"x = (a,\nif b,\n c)\n", [(0, 3, 0)]),                   # still open after the "if" line
+    (b"x = (1,\nif a) \\\n+ 2\n", [(0, 3, 0)]),                # "if" line ends in a backslash
+    ([b"  ", b"x = (1,\n", b"2)\n"], [(1, 2, 0)]),              # blanks alone give nothing
+    ([b"\n", b"   \n", b"x\n", b"   "], [(2, 1, 0)]),
+    ([b"x = (1,\r", b"2)\r", b"y = 3\r"], [(0, 2, 0), (2, 1, 0)]),
+    ([b"x = (1,", b"2)", b"y"], [(0, 2, 0), (2, 1, 0)]),        # no terminators
+    ([b"s = 'ab", b"cd'\n"], JOINED),                          # an unterminated chunk runs on
+])
+def test_logical_line_ranges(source, ranges):
+    assert [(ln.fFirstLine, ln.fLineCount, ln.fIncomplete) for ln in read(source, **KEEP)] == ranges
+
+
+@pytest.mark.parametrize("chunks, positions", [
+    ([b"x = (1,\n", b"     2)\n"], [(0, 0), (0, 2), (0, 4), (0, 5), (0, 6), (1, 5), (1, 6)]),
+    ([b"    '''a\n", b"\n", b"b''' + c\n"], [(0, 4), (2, 5), (2, 7)]),
+    ([b"a\rx = '''q\n", b"'''\n"], [(0, 0), (0, 2), (0, 4), (0, 6)]),
+    ([b"a\rs = 'q\\\n", b"z\n"], [(0, 0), (0, 2), (0, 4), (0, 6)]),  # error token from line 0
+    ([b"x = 1 + '''abc\n", b"def\n"], [(0, 0), (0, 2), (0, 4), (0, 6), (0, 8)]),
+    ([b"x = (1,\r\n", b" 2)\r\n"], [(0, 0), (0, 2), (0, 4), (0, 5), (0, 6), (1, 1), (1, 2)]),
+])
+def test_tokens_are_placed_where_they_begin(chunks, positions):
+    for copy_strings in (True, False):
+        (line,) = read(chunks, copy_strings=copy_strings)
+        assert [position for _, position in line.fTokens] == positions
+
+
+@pytest.mark.parametrize("source, indent, tabs, spaces", [
+    (b"x\n", 0, False, False), (b"\t  x\n", 10, True, True), (b" \tx\n", 8, True, True),
+    (b"\x0cx\n", 0, False, False),                  # a form feed counts nothing
+    (b"   # c\n", 3, False, True),                  # comments measure too
+    (b"  f(1,\n\t\t2)\n", 2, False, True),          # only the first physical line counts
+    (b"x = (1,\n  return 2\n", 2, False, True),     # a handed-back line is measured afresh
+])
+def test_indentation_of_the_first_physical_line(source, indent, tabs, spaces):
+    line = read(source, **KEEP)[-1]
+    assert (line.fIndentLevel, line.fTabsInIndent, line.fSpacesInIndent) == (indent, tabs, spaces)
+
+
+def test_sixteen_bit_fields_wrap():  # too big for the model, which copies text per line
+    parser = logicalline.CreateLogicalLineParser()
+
+    def read(source):
+        chunks = iter(source if isinstance(source, list) else [source])
+        return parser.GetLogicalLineList(lambda: next(chunks, b""))
+    (wide,) = read(b" " * 40000 + b"a = " + b"b" * 100000 + b" + c\n")
+    assert wide.fIndentLevel == 40000 - 65536 and wide.fTokens[-1] == ("c", (0, 140007 % 65536))
+    pytest.raises(SystemError, wide.Copy)  # an indentation that reads back negative
+    (tall,) = read([b"x = (\n"] + [b"1,\n"] * 69998 + [b")\n"])
+    assert tall.fLineCount == 70000 - 65536 and tall.fTokens[-1] == (")", (69999 % 65536, 0))
+    (deep,) = read(b"x = " + b"(" * 100000 + b")" * 100000 + b"\n")
+    assert deep.fTokenCount == 200002 and deep.fType is logicalline.kAssignment
+
+
+@pytest.mark.parametrize("first_line, line_count, first_lines", [
+    (10, 2, [10, 11]),                       # the line that starts on 11 is still read whole
+    (0, 0, []),
+    (2**31 - 3, 3, [2**31 - 3, 2**31 - 2]),  # the stop line, 2**31, does not wrap around
+    (2**31 - 3, -1, OverflowError),
+    (2**31 - 2, 2**31 - 1, OverflowError),
+])
+def test_reading_windows(first_line, line_count, first_lines):
+    chunks = [b"x\n", b"y = (\n", b")\n", b"z\n"]
+    if first_lines is OverflowError:
+        with pytest.raises(OverflowError, match="Line number does not fit in 32 bits"):
+            read(chunks, first_line, line_count)
+    else:
+        lines = read(chunks, first_line, line_count)
+        assert [line.fFirstLine for line in lines] == first_lines
+
+
+@pytest.mark.parametrize("third, error", [
+    ("x\n", TypeError), (None, TypeError), (bytearray(b"x\n"), TypeError),
+    (b"d\x00\n", ValueError), (KeyError("readline"), KeyError),
+    (type("Line", (bytes,), {})(b"y\n"), None),
+])
+def test_readline_misbehaving_on_its_third_call(third, error):
+    results = [b"a = (1,\n", b"2)\n", third, b"b\n", b""]
+
+    def readline():
+        if isinstance(results[0], Exception):
+            raise results[0]
+        return results.pop(0)
+    parser = logicalline.CreateLogicalLineParser()
+    for args in [(None,), (b"x = 1\n",), ()]:
+        pytest.raises(TypeError, parser.GetLogicalLineList, *args)
+    if error is None:
+        assert [texts(line) for line in parser.GetLogicalLineList(readline, 4)][1:] == [["y"], ["b"]]
+        return
+    with pytest.raises(error) as caught:
+        parser.GetLogicalLineList(readline, 4)
+    assert caught.value is third or error is not KeyError
+    if error is ValueError:
+        assert str(caught.value) == "Binary data encountered at lineno 6 while tokenizing"
+
+
+def test_readline_that_parses_while_being_read():
+    parser = logicalline.CreateLogicalLineParser()
+    source, nested = [b"x = (1,\n", b"2)\n", b"y\n"], []
+
+    def readline():
+        nested.append(texts(read(b"def f(): pass\n")[0]))
+        return source.pop(0) if source else b""
+    assert [line.fLineCount for line in parser.GetLogicalLineList(readline)] == [2, 1]
+    assert nested == [["def", "f", "(", ")", ":", "pass"]] * 4
+
+    def recursing():
+        return parser.GetLogicalLineList(recursing)
+    pytest.raises(RecursionError, recursing)
+
+
+def test_logical_line_over_2_gib_is_refused(request):
+    if not request.config.getoption("--huge"):
+        pytest.skip("needs --huge: about 3 GB of memory")
+    chunk = b"a" * 2**30
+    with pytest.raises(ValueError, match="Logical line too long"):
+        read([b"s = '''\n", chunk, chunk, b"'''\n"])

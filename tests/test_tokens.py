@@ -1,0 +1,91 @@
+"""Token starts, code units, and the token queries of a line."""
+import random
+
+import pytest
+
+import logicalline
+from model import first_code_unit, token_id_for_start
+from test_model_agreement import read
+
+
+def assert_module_matches_model(inputs):
+    for data in inputs:
+        assert (logicalline.GetIdForTokenStart(data), ord(logicalline._GetFirstCodeUnit(data))) == (
+            token_id_for_start(data), first_code_unit(data)), data
+
+
+@pytest.mark.parametrize("text, token_id", [
+    ("<>", 29), ("!", 201), ("@=", 50), (":=", 53), ("->", 51), ("...", 52), ("..", 23),
+    ("**=", 47), ("<<=", 45), ("//=", 49), ("/=", 40), ("`", 25), ("\\", 203),
+    (".5", 2), (".a", 23), ("_x", 1), ("é", 1), ("²", 201), ("٣", 201),
+    ("\U000E0041", 1),      # only the low 16 bits, U+0041, are classified
+    ("\U00020000", 201),    # a letter whose low 16 bits are U+0000
+    ("r'x'", 3), ("RB''", 3), ("Ur''", 3), ("fR''", 3), ("f'", 3), ('"""', 3),
+    ("bu''", 1), ("rr''", 1), ("bar'", 1), ("fr ", 1),
+    ("#", 202), ("\r\n", 4), ("\r", 4), ("", 201), (" x", 201), ("\0", 201), ("$", 201),
+])
+def test_token_id_for_start(text, token_id):
+    assert logicalline.GetIdForTokenStart(text) == logicalline.GetIdForTokenStart(text.encode())
+    assert logicalline.GetIdForTokenStart(text) == token_id == token_id_for_start(text.encode())
+
+
+@pytest.mark.parametrize("data, unit", [
+    (b"abc", 0x61), (b"", 0), ("€".encode(), 0x20AC), ("😀".encode(), 0xF600),
+    (b"\x80", 0), (b"\xc3", 0), (b"\xc3A", 0), (b"\xf0\x9f\x98", 0), (b"\xf8\x80\x80\x80", 0),
+    (b"\xc1\x81", 0x41), (b"\xed\xa0\x80", 0xD800), ("€uro", 0x20AC),  # str is read as UTF-8
+])
+def test_first_code_unit(data, unit):
+    result = logicalline._GetFirstCodeUnit(data)
+    assert type(result) is str and len(result) == 1 and ord(result) == unit
+
+
+@pytest.mark.parametrize("function", [logicalline.GetIdForTokenStart,
+                                      logicalline._GetFirstCodeUnit])
+@pytest.mark.parametrize("args, error", [
+    ((), TypeError), ((b"a", b"b"), TypeError), ((None,), TypeError),
+    ((bytearray(b"a"),), TypeError), (("\ud800",), UnicodeEncodeError),
+])
+def test_argument_errors(function, args, error):
+    with pytest.raises(error):
+        function(*args)
+
+
+def test_short_and_random_inputs_match_model(request):
+    rng = random.Random(20240607)
+    pieces = [bytes([c]) for c in b"'\"rBuFx_1.#<=>*/!-\\\n\r \x80\xc3\xff"] + [
+        b"\xe2\x82", b"\xf0\x9f", b"\xf3\xa0\x81", "é".encode(), "²".encode()]
+    assert_module_matches_model([bytes([a, b]) for a in range(256) for b in range(256)]
+                                + [b"".join(rng.choices(pieces, k=rng.randint(2, 6)))
+                                   for _ in range(4000)])
+    if request.config.getoption("--exhaustive"):
+        for a in range(256):
+            assert_module_matches_model([bytes([a, b, c]) for b in range(256) for c in range(256)])
+
+
+@pytest.mark.parametrize("source, index, kind, kind_skipped, text, text_skipped", [
+    (b"x = 0x1F\n", 2, 2, 2, "0x1F", "0x1F"),
+    (b"x = 1  # note\n", 3, 202, 202, "# note\n", "# note\n"),
+    (b"a <> b\n", 1, 29, 29, "!=", "!="),
+    (b"s = 'abc'\n", 2, 3, 3, "'abc'", "'abc'"),
+    (b"s = 'abc\n", 2, 201, 3, "<errortoken> 'abc", "'abc"),
+    (b"x = $\n", 2, 201, 201, "<errortoken> $", "$"),
+    (b"x = \xff\n", 2, 201, 201, "<errortoken> \ufffd", "\ufffd"),
+])
+def test_token_kind_and_text(source, index, kind, kind_skipped, text, text_skipped):
+    (line,) = read(source, remove_comments=False)
+    assert (line.GetTokenType(index), line.GetTokenType(i=index, skip_error_prefix=7)) == (
+        kind, kind_skipped)
+    assert (line.GetTokenString(index), line.GetTokenString(skip_error_prefix=True, i=index)) == (
+        text, text_skipped)
+
+
+@pytest.mark.parametrize("method", ["GetTokenType", "GetTokenString"])
+@pytest.mark.parametrize("args, kwargs, error", [
+    ((-1,), {}, IndexError), ((3,), {}, IndexError), (("0",), {}, TypeError),
+    ((0,), {"skip": 1}, TypeError), ((2 ** 40,), {}, OverflowError),
+])
+def test_bad_token_arguments(method, args, kwargs, error):
+    (line,) = read(b"x = 1\n")
+    with pytest.raises(error) as info:
+        getattr(line, method)(*args, **kwargs)
+    assert error is not IndexError or str(info.value) == "Invalid token index"
