@@ -21,6 +21,7 @@ int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* 
   InitTextBuffer(&state->fPending);
   state->fLineNumber = firstLine;
   state->fAtEnd = 0;
+  state->fAtStart = 1;
   InitTextBuffer(&state->fText);
   state->fTokenArray = nullptr;
   state->fTokenPositions = nullptr;

@@ -24,6 +24,7 @@ struct ReadingState {
   TextBuffer fPending;   // a physical line read but handed back: the next line to read
   int64_t fLineNumber;   // number of the next physical line to read
   int fAtEnd;            // 1 once readline returned b""
+  int fAtStart;          // 1 until the first physical line is read: it may open with a mark
   TokenCache* fCache;    // texts shared by the whole call
   // The logical line being built.
   TextBuffer fText;      // every physical line read for it, line breaks included

@@ -11,6 +11,10 @@
 
 namespace {
 
+// Editors on some systems open a UTF-8 file with this mark; it is no part of the source.
+constexpr char kByteOrderMark[] = "\xEF\xBB\xBF";
+constexpr Py_ssize_t kByteOrderMarkLength = sizeof(kByteOrderMark) - 1;
+
 // Appends bytes to the logical line text, refusing a text that its 32-bit offsets cannot
 // address.
 int AcceptText(ReadingState* state, const char* bytes, size_t n) {
@@ -40,6 +44,14 @@ int ReadSourceLine(ReadingState* state) {
   Py_ssize_t size = 0;
   // Anything but bytes (a str included) gets the accessor's TypeError.
   if (PyBytes_AsStringAndSize(line.Get(), &bytes, &size) != 0) return -1;
+  if (state->fAtStart) {
+    state->fAtStart = 0;
+    if (size >= kByteOrderMarkLength && memcmp(bytes, kByteOrderMark, kByteOrderMarkLength) == 0) {
+      if (size == kByteOrderMarkLength) return ReadSourceLine(state);  // the mark alone: no line
+      bytes += kByteOrderMarkLength;
+      size -= kByteOrderMarkLength;
+    }
+  }
   state->fAtEnd = size == 0;
   if (size == 0) return 0;
   if (memchr(bytes, '\0', static_cast<size_t>(size))) {

@@ -33,5 +33,6 @@ PyObject* CopyLogicalLine(LogicalLine* source) {
       CopyObjectList(&line->fTypeEquivs, &source->fTypeEquivs) != 0 ||
       CopyObjectList(&line->fArgTypeEquivs, &source->fArgTypeEquivs) != 0)
     return nullptr;
+  if (PyObject_GC_IsTracked(reinterpret_cast<PyObject*>(source))) TrackLine(line);  // holds what it held
   return copy.Release();
 }

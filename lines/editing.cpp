@@ -18,39 +18,47 @@ bool IsScopeStart(const LogicalLine* line) {
   return line->fType == kClassDef || line->fType == kFunctionDef;
 }
 
-int AppendPair(ObjectList* pairs, PyObject* a, PyObject* b) {
+// Every object the host stores goes through here, so that the line is watched for cycles.
+int Store(LogicalLine* line, ObjectList* list, PyObject* const* objects, Py_ssize_t n) {
+  if (AppendObjects(list, objects, n) != 0) return -1;
+  TrackLine(line);
+  return 0;
+}
+
+int AppendPair(LogicalLine* line, ObjectList* pairs, PyObject* a, PyObject* b) {
   PyObject* const pair[] = {a, b};
-  return AppendObjects(pairs, pair, 2);
+  return Store(line, pairs, pair, 2);
 }
 
 }  // namespace
 
 int AppendAttrib(LogicalLine* line, PyObject* object) {
   if (IsScopeStart(line)) return Refuse("Cannot append attrib name type to a class or function def line");
-  return AppendObjects(&line->fNames, &object, 1);
+  return Store(line, &line->fNames, &object, 1);
 }
 
 int AppendArgName(LogicalLine* line, PyObject* object) {
   if (line->fType != kFunctionDef) return Refuse("Cannot append arg name to a non-function def line");
-  return AppendObjects(&line->fNames, &object, 1);
+  return Store(line, &line->fNames, &object, 1);
 }
 
 int AppendBaseClassName(LogicalLine* line, PyObject* object) {
   if (line->fType != kClassDef) return Refuse("Cannot append base class name to a non-class def line");
-  return AppendObjects(&line->fNames, &object, 1);
+  return Store(line, &line->fNames, &object, 1);
 }
 
 int AppendTypeEquiv(LogicalLine* line, PyObject* a, PyObject* b) {
-  return AppendPair(&line->fTypeEquivs, a, b);
+  return AppendPair(line, &line->fTypeEquivs, a, b);
 }
 
 int AppendArgTypeEquiv(LogicalLine* line, PyObject* a, PyObject* b) {
   if (line->fType != kFunctionDef)
     return Refuse("Cannot append arg name type equiv to a non-function def line");
-  return AppendPair(&line->fArgTypeEquivs, a, b);
+  return AppendPair(line, &line->fArgTypeEquivs, a, b);
 }
 
 void SetScopeName(LogicalLine* line, PyObject* name) {
   Py_INCREF(name);
   Py_XSETREF(line->fScopeName, name);
+  TrackLine(line);
 }

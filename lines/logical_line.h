@@ -45,6 +45,9 @@ inline LogicalLine* AsLine(PyObject* object) { return reinterpret_cast<LogicalLi
 // Returns a new record in the fresh state (no tokens, type kUnknown, fLocalScopeName None).
 LogicalLine* NewLogicalLine();
 
+// Has the cyclic collector watch the line, from the first object the host stores in it.
+void TrackLine(LogicalLine* line);
+
 // Releases every appended annotation: the names, then both pair lists.
 void ClearAppended(LogicalLine* line);
 

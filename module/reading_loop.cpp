@@ -54,6 +54,10 @@ PyObject* GetLogicalLineList(PyObject* self, PyObject* args) {
     PyErr_SetString(PyExc_TypeError, "readline arg must be a callable");
     return nullptr;
   }
+  if (firstLine < 0) {  // refused before the host's stream moves
+    PyErr_SetString(PyExc_ValueError, "first line must be >= 0");
+    return nullptr;
+  }
   PyRef list = PyRef::Steal(PyList_New(0));
   if (!list) return nullptr;
   ReadingState state;

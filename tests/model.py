@@ -1,6 +1,7 @@
 """Pure-Python model of the logical line reader, to cross-check the native module with. Clarity
 comes first; regular expressions only speed up plain ASCII runs."""
 import bisect
+import itertools
 import re
 from types import SimpleNamespace
 
@@ -267,6 +268,9 @@ class Source:
 
     def __init__(self, chunks):
         self.chunks, self.pending, self.at_end = iter(chunks), b"", False
+        first = next(self.chunks, b"")  # a byte-order mark opening the input is no source
+        first = first[3:] if first.startswith(b"\xef\xbb\xbf") else first
+        self.chunks = itertools.chain([first] if first else [], self.chunks)
 
     def read(self, lineno):
         if self.pending:
@@ -308,8 +312,6 @@ def build_logical_line(src, lineno, copy_strings, skip_whitespace_lines, remove_
         is_open = True
     if not bld.tokens or (skip_whitespace_lines and all(t[:1] == b"#" for t in bld.tokens)):
         return None, lineno
-    if first < 0:
-        raise SystemError("bad internal call")
     if first > 2**31 - 1:  # line numbers are counted wide but stored in 32 bits
         raise OverflowError("Line number does not fit in 32 bits")
     line_type, name = classify(bld.tokens)
@@ -326,6 +328,8 @@ OPTIONS = ("copy_strings", "skip_whitespace_lines", "remove_comments", "include_
 def model_lines(physical_lines, copy_strings=True, skip_whitespace_lines=True,
                 remove_comments=True, include_line_text=True, first_line=0, line_count=-1):
     """The logical lines of the source that readline hands out as physical_lines."""
+    if first_line < 0:
+        raise ValueError("first line must be >= 0")
     opts = (copy_strings, skip_whitespace_lines, remove_comments, include_line_text)
     stop = first_line + line_count  # never wraps: counted wider than the arguments
     stop = None if line_count == -1 or stop == -1 else stop

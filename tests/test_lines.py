@@ -1,10 +1,13 @@
 """What a host does with its lines: annotate them, copy them, read them back."""
 import copy
+import gc
 import sys
+import weakref
 
 import pytest
 
 import logicalline
+from test_direct_table import DIRECT
 from test_model_agreement import read
 
 REFUSALS = {
@@ -155,3 +158,35 @@ def test_lines_are_read_only_and_only_the_module_makes_them():
     for make in (lambda: object.__new__(type(line)), lambda: type(parser)(),
                  lambda: copy.copy(line), lambda: type("Sub", (type(line),), {})):
         pytest.raises(TypeError, make)
+
+
+class Scope:  # what a host keeps: an object that refers to its line and is stored on it
+    pass
+
+
+@pytest.mark.parametrize("source, store", [
+    (b"x = 1\n", lambda line, o: line.SetScopeName(o)),
+    (b"x = 1\n", lambda line, o: line.AppendAttrib([o])),  # through a list in between
+    (b"def f(): pass\n", lambda line, o: line.AppendArgName(o)),
+    (b"class C: pass\n", lambda line, o: line.AppendBaseClassName(o)),
+    (b"x = 1\n", lambda line, o: line.AppendTypeEquiv("T", o)),
+    (b"def f(): pass\n", lambda line, o: line.AppendArgTypeEquiv(o, "T")),
+    (b"x = 1\n", lambda line, o: DIRECT.AppendAttribDirect(line, o)),
+    (b"def f(): pass\n", lambda line, o: DIRECT.AppendArgNameDirect(line, o)),
+    (b"class C: pass\n", lambda line, o: DIRECT.AppendBaseClassNameDirect(line, o)),
+    (b"x = 1\n", lambda line, o: DIRECT.AppendTypeEquivDirect(line, o, o)),
+    (b"def f(): pass\n", lambda line, o: DIRECT.AppendArgTypeEquivDirect(line, "T", o)),
+])
+def test_cycles_through_annotations_are_collected(source, store):
+    for copied in (False, True):
+        line, scope = line_of(source), Scope()
+        assert not gc.is_tracked(line)  # parsing alone costs the collector nothing
+        scope.line = line
+        store(line, scope)
+        assert gc.is_tracked(line)
+        if copied:  # the copy holds the scope too, and the scope holds only the copy
+            scope.line = line = line.Copy()
+        gone = weakref.ref(scope)
+        del line, scope
+        gc.collect()
+        assert gone() is None

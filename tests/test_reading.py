@@ -3,7 +3,7 @@ indentation, line breaks, windows and limits. Every read is checked against the 
 import pytest
 
 import logicalline
-from test_model_agreement import read
+from test_model_agreement import module_view, read
 
 KEEP = {"skip_whitespace_lines": False, "remove_comments": False}
 
@@ -67,6 +67,19 @@ def test_logical_line_ranges(source, ranges):
     assert [(ln.fFirstLine, ln.fLineCount, ln.fIncomplete) for ln in read(source, **KEEP)] == ranges
 
 
+BOM = b"\xef\xbb\xbf"
+
+
+@pytest.mark.parametrize("marked, plain", [
+    ([BOM + b"def f(a,\n", b"  b): pass\n"], [b"def f(a,\n", b"  b): pass\n"]),
+    ([BOM, b"x = 1\n"], [b"x = 1\n"]),                        # a readline result of the mark alone
+    ([BOM + b"  x = '" + BOM + b"'\n", BOM + b"y\n"],          # a mark elsewhere stays what it is
+     [b"  x = '" + BOM + b"'\n", BOM + b"y\n"]),
+])
+def test_byte_order_mark_opening_the_input(marked, plain):
+    assert [module_view(line) for line in read(marked)] == [module_view(line) for line in read(plain)]
+
+
 @pytest.mark.parametrize("chunks, positions", [
     ([b"x = (1,\n", b"     2)\n"], [(0, 0), (0, 2), (0, 4), (0, 5), (0, 6), (1, 5), (1, 6)]),
     ([b"    '''a\n", b"\n", b"b''' + c\n"], [(0, 4), (2, 5), (2, 7)]),
@@ -114,10 +127,15 @@ def test_sixteen_bit_fields_wrap():  # too big for the model, which copies text 
     (2**31 - 3, 3, [2**31 - 3, 2**31 - 2]),  # the stop line, 2**31, does not wrap around
     (2**31 - 3, -1, OverflowError),
     (2**31 - 2, 2**31 - 1, OverflowError),
+    (-5, -1, ValueError),
 ])
 def test_reading_windows(first_line, line_count, first_lines):
     chunks = [b"x\n", b"y = (\n", b")\n", b"z\n"]
-    if first_lines is OverflowError:
+    if first_lines is ValueError:  # refused before readline is called
+        with pytest.raises(ValueError, match="^first line must be >= 0$"):
+            logicalline.CreateLogicalLineParser().GetLogicalLineList(
+                lambda: pytest.fail("readline called"), first_line, line_count)
+    elif first_lines is OverflowError:
         with pytest.raises(OverflowError, match="Line number does not fit in 32 bits"):
             read(chunks, first_line, line_count)
     else:
