@@ -9,7 +9,7 @@
 #include "core/growth.h"
 
 int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
-                     int64_t firstLine) {
+                     const char* data, const char* dataEnd, int64_t firstLine) {
   state->fCache = static_cast<TokenCache*>(PyMem_Malloc(sizeof(TokenCache)));
   if (!state->fCache) {
     PyErr_NoMemory();
@@ -18,6 +18,8 @@ int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* 
   InitTokenCache(state->fCache);
   state->fOptions = options;
   state->fReadline = readline;
+  state->fData = data;
+  state->fDataEnd = dataEnd;
   InitTextBuffer(&state->fPending);
   state->fLineNumber = firstLine;
   state->fAtEnd = 0;

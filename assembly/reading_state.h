@@ -19,8 +19,10 @@ constexpr int kInlineLineStarts = 8;
 
 struct ReadingState {
   ReadOptions fOptions;
-  // The source.
-  PyObject* fReadline;   // borrowed from the caller
+  // The source: the host's readline, or else a buffer of the whole text.
+  PyObject* fReadline;   // borrowed from the caller, or null
+  const char* fData;     // the buffer's next physical line, when there is no readline
+  const char* fDataEnd;
   TextBuffer fPending;   // a physical line read but handed back: the next line to read
   int64_t fLineNumber;   // number of the next physical line to read
   int fAtEnd;            // 1 once readline returned b""
@@ -44,9 +46,10 @@ struct ReadingState {
   int fInlineLineStarts[kInlineLineStarts];
 };
 
-// Sets up a call's state. Returns 0, or -1 with MemoryError set (nothing to release then).
+// Sets up a call's state, reading through readline, or from [data, dataEnd) when readline is
+// null. Returns 0, or -1 with MemoryError set (nothing to release then).
 int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
-                     int64_t firstLine);
+                     const char* data, const char* dataEnd, int64_t firstLine);
 
 // Releases every reference and block the state holds.
 void ReleaseReadingState(ReadingState* state);

@@ -1,4 +1,5 @@
-// Reading physical lines through readline. The source stays bytes: nothing is decoded here.
+// Reading physical lines through readline or from a buffer. The source stays bytes: nothing is
+// decoded here.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
@@ -29,6 +30,27 @@ int AcceptText(ReadingState* state, const char* bytes, size_t n) {
   return 0;
 }
 
+// Takes the next physical line from the source: a readline result (held in `line` while it is
+// read), or the buffer up to and including its next line feed, as BytesIO.readline cuts it.
+// Returns 0, or -1 with an exception set.
+int NextPhysicalLine(ReadingState* state, PyRef* line, const char** bytes, Py_ssize_t* size) {
+  if (!state->fReadline) {
+    const char* start = state->fData;
+    const auto* feed = start == state->fDataEnd
+                           ? nullptr
+                           : static_cast<const char*>(memchr(
+                                 start, '\n', static_cast<size_t>(state->fDataEnd - start)));
+    state->fData = feed ? feed + 1 : state->fDataEnd;
+    *bytes = start;
+    *size = state->fData - start;
+    return 0;
+  }
+  *line = PyRef::Steal(PyObject_CallNoArgs(state->fReadline));
+  if (!*line) return -1;
+  // Anything but bytes (a str included) gets the accessor's TypeError.
+  return PyBytes_AsStringAndSize(line->Get(), const_cast<char**>(bytes), size);
+}
+
 }  // namespace
 
 int ReadSourceLine(ReadingState* state) {
@@ -38,12 +60,10 @@ int ReadSourceLine(ReadingState* state) {
     ResetTextBuffer(pending);
     return 0;
   }
-  PyRef line = PyRef::Steal(PyObject_CallNoArgs(state->fReadline));
-  if (!line) return -1;
-  char* bytes = nullptr;
+  PyRef line;
+  const char* bytes = nullptr;
   Py_ssize_t size = 0;
-  // Anything but bytes (a str included) gets the accessor's TypeError.
-  if (PyBytes_AsStringAndSize(line.Get(), &bytes, &size) != 0) return -1;
+  if (NextPhysicalLine(state, &line, &bytes, &size) != 0) return -1;
   if (state->fAtStart) {
     state->fAtStart = 0;
     if (size >= kByteOrderMarkLength && memcmp(bytes, kByteOrderMark, kByteOrderMarkLength) == 0) {

@@ -1,4 +1,4 @@
-// The per-call token text cache: direct-mapped, so a miss simply replaces the slot.
+// The per-call token text cache.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
@@ -7,44 +7,70 @@
 #include <cstdint>
 #include <cstring>
 
+#include "tokenizer/token_text.h"
+
+namespace {
+
+constexpr size_t kMaxCacheSlots = 4096;
+
+// Moves the texts into a table four times the size, once half the slots are filled. A text
+// that finds its new slot taken is dropped: the cache only ever saves work.
+void GrowCache(TokenCache* cache) {
+  if (cache->fSlotCount >= kMaxCacheSlots || cache->fFilled * 2 < cache->fSlotCount) return;
+  const size_t count = cache->fSlotCount * 4;
+  auto* slots = static_cast<CacheSlot*>(PyMem_Calloc(count, sizeof(CacheSlot)));
+  if (!slots) return;  // the small table still serves
+  size_t filled = 0;
+  for (size_t i = 0; i < cache->fSlotCount; i++) {
+    CacheSlot& old = cache->fSlots[i];
+    if (!old.fBytes) continue;
+    CacheSlot& slot = slots[old.fHash & (count - 1)];
+    if (slot.fBytes) {
+      Py_DECREF(old.fBytes);
+    } else {
+      slot = old;
+      filled++;
+    }
+  }
+  if (cache->fSlots != cache->fInline) PyMem_Free(cache->fSlots);
+  cache->fSlots = slots;
+  cache->fSlotCount = count;
+  cache->fFilled = filled;
+}
+
+}  // namespace
+
 void InitTokenCache(TokenCache* cache) {
-  memset(cache->fSlots, 0, sizeof(cache->fSlots));
-  memset(cache->fHashes, 0, sizeof(cache->fHashes));
+  memset(cache->fInline, 0, sizeof(cache->fInline));
   memset(cache->fById, 0, sizeof(cache->fById));
+  cache->fSlots = cache->fInline;
+  cache->fSlotCount = kInlineCacheSlots;
+  cache->fFilled = 0;
 }
 
 void ClearTokenCache(TokenCache* cache) {
-  for (PyObject*& slot : cache->fSlots) Py_CLEAR(slot);
+  for (size_t i = 0; i < cache->fSlotCount; i++) Py_XDECREF(cache->fSlots[i].fBytes);
   for (PyObject*& slot : cache->fById) Py_CLEAR(slot);
-}
-
-// Mixes the first and last eight bytes and the length: enough to spread token texts over the
-// slots, at a fixed cost whatever the length.
-static uint32_t HashText(const char* p, Py_ssize_t n) {
-  uint64_t head = 0;
-  uint64_t tail = 0;
-  memcpy(&head, p, static_cast<size_t>(n < 8 ? n : 8));
-  if (n > 8) memcpy(&tail, p + n - 8, 8);
-  const uint64_t mixed = (head ^ (tail * 0x9E3779B97F4A7C15ull) ^ static_cast<uint64_t>(n)) *
-                         0xFF51AFD7ED558CCDull;
-  return static_cast<uint32_t>(mixed >> 32);
+  if (cache->fSlots != cache->fInline) PyMem_Free(cache->fSlots);
 }
 
 PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n) {
   if (n > kCachedTextLimit || n <= 1) return PyBytes_FromStringAndSize(p, n);
   const uint32_t hash = HashText(p, n);
-  const uint32_t index = hash & (kTokenCacheSlots - 1);
-  PyObject*& slot = cache->fSlots[index];
-  if (slot && cache->fHashes[index] == hash && PyBytes_GET_SIZE(slot) == n &&
-      memcmp(PyBytes_AS_STRING(slot), p, static_cast<size_t>(n)) == 0) {
-    Py_INCREF(slot);
-    return slot;
+  CacheSlot& slot = cache->fSlots[hash & (cache->fSlotCount - 1)];
+  if (slot.fBytes && slot.fHash == hash && PyBytes_GET_SIZE(slot.fBytes) == n &&
+      memcmp(PyBytes_AS_STRING(slot.fBytes), p, static_cast<size_t>(n)) == 0) {
+    Py_INCREF(slot.fBytes);
+    return slot.fBytes;
   }
   PyObject* bytes = PyBytes_FromStringAndSize(p, n);
   if (!bytes) return nullptr;
-  cache->fHashes[index] = hash;
-  Py_XSETREF(slot, bytes);
   Py_INCREF(bytes);
+  if (!slot.fBytes) cache->fFilled++;
+  PyObject* old = slot.fBytes;
+  slot = CacheSlot{.fBytes = bytes, .fHash = hash};
+  Py_XDECREF(old);
+  GrowCache(cache);
   return bytes;
 }
 

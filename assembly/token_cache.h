@@ -1,26 +1,36 @@
-// Token texts shared within one GetLogicalLineList call: the same name, number or operator
-// text read again hands out the same immutable bytes object instead of a new one.
+// Token texts shared within one reading call: the same name, number or operator text read
+// again hands out the same immutable bytes object instead of a new one.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
+#include <cstddef>
 #include <cstdint>
 
 #include "core/token_ids.h"
 
-constexpr int kTokenCacheSlots = 4096;      // a power of two
 constexpr Py_ssize_t kCachedTextLimit = 40;  // longer texts are rarely repeated
+constexpr size_t kInlineCacheSlots = 256;   // what a short source needs; a power of two
 
+struct CacheSlot {
+  PyObject* fBytes;  // owned, or null
+  uint32_t fHash;    // of fBytes's text, checked before the text
+};
+
+// Direct-mapped: a miss replaces the slot. It starts small, so that a short source costs
+// little to set up, and grows with the texts it holds.
 struct TokenCache {
-  PyObject* fSlots[kTokenCacheSlots];  // owned bytes objects, or null
-  uint32_t fHashes[kTokenCacheSlots];  // hash of each slot's text, checked before the text
-  PyObject* fById[kTokenIdLimit];      // owned fixed texts of operators and placeholders
+  CacheSlot* fSlots;  // fInline, or a heap block
+  size_t fSlotCount;
+  size_t fFilled;     // slots that hold a text
+  CacheSlot fInline[kInlineCacheSlots];
+  PyObject* fById[kTokenIdLimit];  // owned fixed texts of operators and the string placeholder
 };
 
 void InitTokenCache(TokenCache* cache);
 
-// Releases every object that the cache holds.
+// Releases every object that the cache holds, and its storage; the cache is not used again.
 void ClearTokenCache(TokenCache* cache);
 
 // Returns a new reference to a bytes object holding the n bytes at p.

@@ -78,12 +78,15 @@ def describe(line: LogicalLine) -> str:
     return f"{' | '.join(facts)}: {head[:40]}"
 
 
-
 def main() -> int:
     parser = logicalline.CreateLogicalLineParser(copy_strings=True, skip_whitespace_lines=True,
                                                  remove_comments=False, include_line_text=True)
     with open(__file__, "rb") as handle:
-        lines = read(parser, handle.read())
+        source = handle.read()
+    lines = read(parser, source)
+    # A whole file in memory is read faster from the buffer: the same lines, no readline calls.
+    same = parser.GetLogicalLineListFromBuffer(memoryview(source), 0, -1)
+    assert [line.fTokens for line in same] == [line.fTokens for line in lines]
     for line in lines:
         annotate(line, line.fLocalScopeName or "<module>")
         print(describe(line))

@@ -1,16 +1,40 @@
 // Building fTokens. Entries hold only str, int and tuples of those, which can take part in no
-// cycle, so the collector need not walk them.
+// cycle, so the collector need not walk them. Being immutable, the parts that repeat from line
+// to line are made once for the process and shared: the positions of the first lines and
+// columns, and the texts of short tokens. Sharing them cannot be observed, and it takes most
+// of the allocations out of an entry.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
 #include "lines/tokens_tuple.h"
 
 #include <cstdint>
+#include <cstring>
 
 #include "core/py_ref.h"
 #include "tokenizer/token_queries.h"
+#include "tokenizer/token_text.h"
 
 namespace {
+
+// Positions up to these bounds are shared; they cover nearly every token of real source.
+constexpr int kSharedLines = 16;
+constexpr int kSharedColumns = 256;
+PyObject* gPositions[kSharedLines][kSharedColumns];  // owned, made at first use
+
+// Texts of short tokens, by content; a slot holds a token's bytes and the str shown for it.
+constexpr uint32_t kTextSlots = 4096;  // a power of two
+constexpr Py_ssize_t kSharedTextLimit = 40;
+struct TextSlot {
+  PyObject* fToken;  // owned bytes, or null
+  PyObject* fText;   // owned str
+};
+TextSlot gTexts[kTextSlots];
+
+// Whole entries, by the shared text and position they hold: the same token at the same place
+// recurs from line to line ("self" at column 8, "=" after a short name).
+constexpr uintptr_t kEntrySlots = 8192;  // a power of two
+PyObject* gEntries[kEntrySlots];  // owned (text, position) tuples, or null
 
 PyObject* NewPair(PyObject* first, PyObject* second) {
   PyObject* pair = PyTuple_New(2);
@@ -23,38 +47,71 @@ PyObject* NewPair(PyObject* first, PyObject* second) {
   return pair;
 }
 
-// The texts of one fTokens tuple. The reader hands out one object per repeated token text,
-// so a repeated token decodes once. Borrowed: the entries built so far hold them.
-struct SharedTexts {
-  static constexpr uintptr_t kSlots = 64;
-  PyObject* fToken[kSlots] = {};
-  PyObject* fText[kSlots] = {};
+PyObject* NewPosition(TokenPosition position) {
+  PyRef row = PyRef::Steal(PyLong_FromLong(position.fLine));
+  if (!row) return nullptr;
+  PyRef column = PyRef::Steal(PyLong_FromLong(position.fColumn));
+  if (!column) return nullptr;
+  return NewPair(row.Get(), column.Get());
+}
 
-  PyObject* TextOf(PyObject* token) {
-    const uintptr_t slot = (reinterpret_cast<uintptr_t>(token) >> 4) % kSlots;
-    if (fToken[slot] == token) {
-      Py_INCREF(fText[slot]);
-      return fText[slot];
-    }
-    PyObject* text = TokenStr(token);
-    if (text) {
-      fToken[slot] = token;
-      fText[slot] = text;
-    }
-    return text;
+bool IsSharedPosition(TokenPosition position) {
+  return position.fLine < kSharedLines && position.fColumn < kSharedColumns;
+}
+
+bool IsSharedText(PyObject* token) { return PyBytes_GET_SIZE(token) <= kSharedTextLimit; }
+
+// Returns a new reference to the str shown for a token.
+PyObject* TextOf(PyObject* token) {
+  const TokenText text(token);
+  if (!IsSharedText(token)) return TokenStr(token);
+  TextSlot& slot = gTexts[HashText(text.fBytes, text.fLength) & (kTextSlots - 1)];
+  if (slot.fToken && (slot.fToken == token || (PyBytes_GET_SIZE(slot.fToken) == text.fLength &&
+                                               memcmp(PyBytes_AS_STRING(slot.fToken), text.fBytes,
+                                                      static_cast<size_t>(text.fLength)) == 0))) {
+    Py_INCREF(slot.fText);
+    return slot.fText;
   }
-};
+  PyObject* shown = TokenStr(token);
+  if (!shown) return nullptr;
+  Py_INCREF(token);
+  Py_INCREF(shown);
+  PyObject* oldToken = slot.fToken;
+  PyObject* oldText = slot.fText;
+  slot = TextSlot{.fToken = token, .fText = shown};
+  Py_XDECREF(oldToken);
+  Py_XDECREF(oldText);
+  return shown;
+}
+
+// Returns a new reference to the entry (text, position), shared when both parts are.
+PyObject* EntryOf(PyObject* text, PyObject* position, bool shared) {
+  if (!shared) return NewPair(text, position);
+  const uintptr_t key = (reinterpret_cast<uintptr_t>(text) >> 4) * 31 +
+                        (reinterpret_cast<uintptr_t>(position) >> 4);
+  PyObject*& slot = gEntries[key & (kEntrySlots - 1)];
+  if (slot && PyTuple_GET_ITEM(slot, 0) == text && PyTuple_GET_ITEM(slot, 1) == position) {
+    Py_INCREF(slot);
+    return slot;
+  }
+  PyObject* entry = NewPair(text, position);
+  if (entry) {
+    Py_INCREF(entry);
+    Py_XSETREF(slot, entry);
+  }
+  return entry;
+}
 
 PyObject* BuildTokensTuple(LogicalLine* line) {
   PyRef tuple = PyRef::Steal(PyTuple_New(line->fTokenCount));
   if (!tuple) return nullptr;
-  SharedTexts shared;
   for (int i = 0; i < line->fTokenCount; i++) {
     PyRef position = PyRef::Steal(PositionTuple(line->fTokenPositions[i]));
     if (!position) return nullptr;
-    PyRef text = PyRef::Steal(shared.TextOf(line->fTokenArray[i]));
+    PyRef text = PyRef::Steal(TextOf(line->fTokenArray[i]));
     if (!text) return nullptr;
-    PyObject* entry = NewPair(text.Get(), position.Get());
+    const bool shared = IsSharedText(line->fTokenArray[i]) && IsSharedPosition(line->fTokenPositions[i]);
+    PyObject* entry = EntryOf(text.Get(), position.Get(), shared);
     if (!entry) return nullptr;
     PyTuple_SET_ITEM(tuple.Get(), i, entry);
   }
@@ -65,11 +122,14 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
 }  // namespace
 
 PyObject* PositionTuple(TokenPosition position) {
-  PyRef row = PyRef::Steal(PyLong_FromLong(position.fLine));
-  if (!row) return nullptr;
-  PyRef column = PyRef::Steal(PyLong_FromLong(position.fColumn));
-  if (!column) return nullptr;
-  return NewPair(row.Get(), column.Get());
+  if (!IsSharedPosition(position)) return NewPosition(position);
+  PyObject*& shared = gPositions[position.fLine][position.fColumn];
+  if (!shared) {
+    shared = NewPosition(position);
+    if (!shared) return nullptr;
+  }
+  Py_INCREF(shared);
+  return shared;
 }
 
 PyObject* LineTokens(LogicalLine* line) {

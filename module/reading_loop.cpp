@@ -1,5 +1,6 @@
 // The reading loop: asks the builder for one logical line at a time until the input ends or
 // the stop line is reached, and builds a line from each. A failure returns no partial list.
+// The source is the host's readline, or a buffer that the call keeps locked while it reads.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
@@ -37,6 +38,27 @@ int ReadLines(ReadingState* state, int64_t stop, PyObject* list) {
   return 0;
 }
 
+// Reads the source through readline, or from [data, dataEnd) when readline is null. Returns a
+// new list, or nullptr with an exception set.
+PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const char* dataEnd,
+                     int firstLine, int lineCount) {
+  if (firstLine < 0) {  // refused before the host's stream moves
+    PyErr_SetString(PyExc_ValueError, "first line must be >= 0");
+    return nullptr;
+  }
+  PyRef list = PyRef::Steal(PyList_New(0));
+  if (!list) return nullptr;
+  ReadingState state;
+  if (InitReadingState(&state, OptionsOf(reinterpret_cast<LogicalLineParser*>(self)), readline,
+                       data, dataEnd, firstLine) != 0)
+    return nullptr;
+  // Counted in 64 bits, so that no sum of the two arguments wraps; -1 means no stop line.
+  const int64_t stop = lineCount == -1 ? -1 : static_cast<int64_t>(firstLine) + lineCount;
+  const int status = ReadLines(&state, stop, list.Get());
+  ReleaseReadingState(&state);
+  return status == 0 ? list.Release() : nullptr;
+}
+
 PyDoc_STRVAR(kGetLogicalLineListDoc,
              "Read logical lines from buffer.  Text is obtained through a readline function that "
              "is the first arguement to this method.  The 2nd & 3rd arguments optional; the 2nd "
@@ -54,26 +76,34 @@ PyObject* GetLogicalLineList(PyObject* self, PyObject* args) {
     PyErr_SetString(PyExc_TypeError, "readline arg must be a callable");
     return nullptr;
   }
-  if (firstLine < 0) {  // refused before the host's stream moves
-    PyErr_SetString(PyExc_ValueError, "first line must be >= 0");
+  return ReadSource(self, readline, nullptr, nullptr, firstLine, lineCount);
+}
+
+PyDoc_STRVAR(kGetLogicalLineListFromBufferDoc,
+             "Read logical lines from a bytes-like object (bytes, bytearray, memoryview, mmap) "
+             "that holds the whole source, as GetLogicalLineList does with the readline of an "
+             "io.BytesIO over it, without calling Python code for reading.  The 2nd & 3rd "
+             "arguments are the line # of the first line and the number of lines to scan, as for "
+             "GetLogicalLineList.  The buffer stays locked while the call runs.");
+PyObject* GetLogicalLineListFromBuffer(PyObject* self, PyObject* args) {
+  Py_buffer view;
+  int firstLine = 0;
+  int lineCount = -1;
+  // "y*" takes any object with the buffer protocol, and refuses a str with TypeError.
+  if (!PyArg_ParseTuple(args, "y*|ii:GetLogicalLineListFromBuffer", &view, &firstLine,
+                        &lineCount))
     return nullptr;
-  }
-  PyRef list = PyRef::Steal(PyList_New(0));
-  if (!list) return nullptr;
-  ReadingState state;
-  if (InitReadingState(&state, OptionsOf(reinterpret_cast<LogicalLineParser*>(self)), readline,
-                       firstLine) != 0)
-    return nullptr;
-  // Counted in 64 bits, so that no sum of the two arguments wraps; -1 means no stop line.
-  const int64_t stop = lineCount == -1 ? -1 : static_cast<int64_t>(firstLine) + lineCount;
-  const int status = ReadLines(&state, stop, list.Get());
-  ReleaseReadingState(&state);
-  return status == 0 ? list.Release() : nullptr;
+  const char* data = static_cast<const char*>(view.buf);
+  PyObject* list = ReadSource(self, nullptr, data, data + view.len, firstLine, lineCount);
+  PyBuffer_Release(&view);
+  return list;
 }
 
 }  // namespace
 
 PyMethodDef kParserMethods[] = {
     {"GetLogicalLineList", GetLogicalLineList, METH_VARARGS, kGetLogicalLineListDoc},
+    {"GetLogicalLineListFromBuffer", GetLogicalLineListFromBuffer, METH_VARARGS,
+     kGetLogicalLineListFromBufferDoc},
     {nullptr, nullptr, 0, nullptr},
 };

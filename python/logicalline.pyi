@@ -7,6 +7,8 @@
 from collections.abc import Callable
 from typing import Final, Protocol, final, type_check_only
 
+from typing_extensions import Buffer
+
 # Line types: the value of LogicalLine.fType is the identical bytes object.
 kUnknown: Final[bytes]
 kClassDef: Final[bytes]
@@ -110,6 +112,11 @@ class LogicalLineParser:
     # hook installed the list holds whatever the hook returned instead of LogicalLine objects.
     def GetLogicalLineList(
         self, readline: Callable[[], bytes], first_line: int = 0, line_count: int = -1, /
+    ) -> list[LogicalLine]: ...
+    # The same lines as GetLogicalLineList over io.BytesIO(data).readline, with no Python call
+    # per line: data is bytes, bytearray, memoryview or mmap (not str), locked while it reads.
+    def GetLogicalLineListFromBuffer(
+        self, data: Buffer, first_line: int = 0, line_count: int = -1, /
     ) -> list[LogicalLine]: ...
 
 @type_check_only

@@ -57,6 +57,24 @@ def replacing(*parts):
 logicalline.SetLogicalCreateFunction(replacing)
 del replacing
 assert read(b"a\nb\n") == ["first", "second"]
+''', "hooks that try to change the buffer being read": r'''
+import mmap
+data, mapped = bytearray(b"x = 1\ny = (2,\n 3)\n"), mmap.mmap(-1, 8)
+mapped.write(b"a\nb\nc\nd\n")
+def changing(*parts):
+    try:
+        change()
+        return "changed"
+    except BufferError:
+        return parts[1]
+logicalline.SetLogicalCreateFunction(changing)
+parser = logicalline.CreateLogicalLineParser()
+change = lambda: data.extend(b"z\n")
+assert parser.GetLogicalLineListFromBuffer(data) == [0, 1]
+change = mapped.close
+assert parser.GetLogicalLineListFromBuffer(mapped, 7) == [7, 8, 9, 10]
+data.extend(b"w\n")  # free again once the call is over
+mapped.close()
 '''}
 
 

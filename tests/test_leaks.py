@@ -82,6 +82,9 @@ def parsing():
         attempt(parser.GetLogicalLineList, *args)
     for window in ((2**31 - 2,), (-5,), (3, 4), (0, 0)):
         attempt(read, SOURCE, *window)
+        attempt(parser.GetLogicalLineListFromBuffer, bytearray(SOURCE), *window)
+    for data in (memoryview(SOURCE)[5:], b"x\n\x00", "x", None):
+        attempt(parser.GetLogicalLineListFromBuffer, data)
     attempt(logicalline.CreateLogicalLineParser, UNTRUTHFUL)
 
 

@@ -70,14 +70,22 @@ def module_view(line):
 
 
 def assert_agreement(chunks, opts, first_line=0, line_count=-1):
-    want = outcome(lambda: [model_view(line) for line in
-                            model.model_lines(chunks, *opts, first_line, line_count)])
-    # A readline call after the final b"" raises StopIteration, which would show here.
-    readline, parser = iter(chunks + [b""]).__next__, logicalline.CreateLogicalLineParser(*opts)
-    got = outcome(lambda: [module_view(line) for line in
-                           parser.GetLogicalLineList(readline, first_line, line_count)])
-    if got != want:
-        where = f"{chunks!r}"[:400] + f"\n{opts}, first_line {first_line}, count {line_count}"
+    """The module reads the chunks as the model does, through readline; and reads the joined
+    text from a buffer as the model does with the text cut where BytesIO.readline cuts it."""
+    data, parser = b"".join(chunks), logicalline.CreateLogicalLineParser(*opts)
+    lines = io.BytesIO(data).readlines()
+    for path, source, read in [
+            # A readline call after the final b"" raises StopIteration, which would show here.
+            ("readline", chunks, lambda: parser.GetLogicalLineList(
+                iter(chunks + [b""]).__next__, first_line, line_count)),
+            ("buffer", lines, lambda: parser.GetLogicalLineListFromBuffer(
+                data, first_line, line_count))]:
+        want = outcome(lambda: [model_view(line) for line in
+                                model.model_lines(source, *opts, first_line, line_count)])
+        got = outcome(lambda: [module_view(line) for line in read()])
+        if got == want:
+            continue
+        where = f"{source!r}"[:400] + f"\n{path}, {opts}, first_line {first_line}, count {line_count}"
         if isinstance(got, list) and isinstance(want, list):
             i = next((i for i, (g, w) in enumerate(zip(got, want)) if g != w), len(got))
             got, want, where = got[i:i + 1], want[i:i + 1], where + f"\nlogical line {i} differs"

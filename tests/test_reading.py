@@ -1,5 +1,7 @@
 """Reading source into logical lines: token cutting, joining and hand-back, positions,
 indentation, line breaks, windows and limits. Every read is checked against the model too."""
+import io
+
 import pytest
 
 import logicalline
@@ -94,6 +96,12 @@ def test_tokens_are_placed_where_they_begin(chunks, positions):
         assert [position for _, position in line.fTokens] == positions
 
 
+def test_positions_past_the_shared_ones():  # the first 16 lines and 256 columns share tuples
+    source = b"x = (\n" + b"\n" * 14 + b" " * 255 + b"a,\n" + b" " * 256 + b"b)\n"
+    assert read(source)[0].fTokens[-4:] == (
+        ("a", (15, 255)), (",", (15, 256)), ("b", (16, 256)), (")", (16, 257)))
+
+
 @pytest.mark.parametrize("source, indent, tabs, spaces", [
     (b"x\n", 0, False, False), (b"\t  x\n", 10, True, True), (b" \tx\n", 8, True, True),
     (b"\x0cx\n", 0, False, False),                  # a form feed counts nothing
@@ -110,8 +118,11 @@ def test_sixteen_bit_fields_wrap():  # too big for the model, which copies text 
     parser = logicalline.CreateLogicalLineParser()
 
     def read(source):
-        chunks = iter(source if isinstance(source, list) else [source])
-        return parser.GetLogicalLineList(lambda: next(chunks, b""))
+        data = b"".join(source) if isinstance(source, list) else source
+        lines = parser.GetLogicalLineListFromBuffer(data)
+        assert [line.fTokens for line in lines] == [  # the two paths agree on huge lines too
+            line.fTokens for line in parser.GetLogicalLineList(io.BytesIO(data).readline)]
+        return lines
     (wide,) = read(b" " * 40000 + b"a = " + b"b" * 100000 + b" + c\n")
     assert wide.fIndentLevel == 40000 - 65536 and wide.fTokens[-1] == ("c", (0, 140007 % 65536))
     pytest.raises(SystemError, wide.Copy)  # an indentation that reads back negative

@@ -55,7 +55,7 @@ struct CharClassTable {
 
 inline constexpr CharClassTable kCharClasses{};
 
-inline bool HasClass(unsigned b, uint8_t c) { return (kCharClasses.fRows[b] & c) != 0; }
+constexpr bool HasClass(unsigned b, uint8_t c) { return (kCharClasses.fRows[b] & c) != 0; }
 inline bool IsAsciiDigit(unsigned b) { return HasClass(b, kAsciiDigit); }
 inline bool IsHexDigit(unsigned b) { return HasClass(b, kHexDigit); }
 inline bool IsBlank(unsigned b) { return HasClass(b, kBlank); }

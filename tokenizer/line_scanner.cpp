@@ -117,7 +117,8 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
       cursor->fAtEnd = 1;
       return;
     }
-    state->fTokenId = TokenIdForStart(table, pos, end);
+    const OperatorEntry* row = nullptr;
+    state->fTokenId = TokenIdForStart(table, pos, end, &row);
     state->fStart = OffsetOf(cursor, pos);
     state->fComplete = 1;
     switch (state->fTokenId) {
@@ -142,16 +143,9 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
       case COMMENT_TOKEN:
         pos = end;  // the comment keeps its line terminator; no newline token follows
         break;
-      default: {
-        const OperatorEntry* row = FindOperator(table, pos, end);
-        if (row) {
-          for (const char* c = row->fSpelling; *c && pos < end; c++) pos++;
-        } else {
-          state->fTokenId = ERROR_TOKEN;
-          pos += StepOverChar(pos, end);
-        }
+      default:  // an operator: its row was found with its id
+        for (const char* c = row->fSpelling; *c; c++) pos++;
         break;
-      }
     }
   }
   if (pos > end) pos = end;

@@ -23,5 +23,7 @@ constexpr ScanState kFreshScan = {
 // ERROR_TOKEN and returns nullptr.
 const char* ScanStringStart(const char* p, const char* end, ScanState* state);
 
-// Returns the id of the token that begins at p in [p, end). Never fails.
-int TokenIdForStart(const OperatorTable* table, const char* p, const char* end);
+// Returns the id of the token that begins at p in [p, end). Never fails. For an operator, the
+// row found is stored in *row when row is given.
+int TokenIdForStart(const OperatorTable* table, const char* p, const char* end,
+                    const OperatorEntry** row = nullptr);

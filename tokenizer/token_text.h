@@ -5,6 +5,7 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
+#include <cstdint>
 #include <cstring>
 #include <string_view>
 
@@ -36,4 +37,16 @@ inline int BracketStep(unsigned first) {
   if (first == '(' || first == '[' || first == '{') return 1;
   if (first == ')' || first == ']' || first == '}') return -1;
   return 0;
+}
+
+// Mixes the first and last eight bytes and the length: enough to spread token texts over the
+// slots of a cache, at a fixed cost whatever the length.
+inline uint32_t HashText(const char* p, Py_ssize_t n) {
+  uint64_t head = 0;
+  uint64_t tail = 0;
+  memcpy(&head, p, static_cast<size_t>(n < 8 ? n : 8));
+  if (n > 8) memcpy(&tail, p + n - 8, 8);
+  const uint64_t mixed = (head ^ (tail * 0x9E3779B97F4A7C15ull) ^ static_cast<uint64_t>(n)) *
+                         0xFF51AFD7ED558CCDull;
+  return static_cast<uint32_t>(mixed >> 32);
 }
