@@ -105,6 +105,8 @@ PyObject* CreateLogicalLine(const LineParts& parts) {
   return CreateNativeLogicalLine(parts);
 }
 
+bool HasCreateHook() { return gCreateHook != nullptr; }
+
 void SetCreateHook(PyObject* hook) {
   // Install before releasing the old hook: its release may run code that installs another.
   Py_INCREF(hook);

@@ -14,5 +14,8 @@ PyObject* CreateLogicalLine(const LineParts& parts);
 // Returns a new native LogicalLine built from the parts, never consulting the hook.
 PyObject* CreateNativeLogicalLine(const LineParts& parts);
 
+// True once a create hook is installed: lines are then the host's own objects.
+bool HasCreateHook();
+
 // Installs the create hook (any object; a new reference is kept), releasing the previous one.
 void SetCreateHook(PyObject* hook);

@@ -5,6 +5,7 @@
 #include "module/parser.h"
 
 #include "module/reading_loop.h"
+#include "module/update.h"
 
 namespace {
 
@@ -17,6 +18,14 @@ int StoreTruth(PyObject* option, int* field) {
   *field = truth;
   return 0;
 }
+
+// Each method is defined, with its docstring, where its work is done.
+PyMethodDef kParserMethods[] = {
+    kGetLogicalLineListMethod,
+    kGetLogicalLineListFromBufferMethod,
+    kUpdateLogicalLineListMethod,
+    {nullptr, nullptr, 0, nullptr},
+};
 
 }  // namespace
 
@@ -46,4 +55,13 @@ PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObje
     return nullptr;
   }
   return reinterpret_cast<PyObject*>(parser);
+}
+
+ReadOptions ParserOptions(PyObject* self) {
+  const LogicalLineParser* parser = reinterpret_cast<const LogicalLineParser*>(self);
+  return ReadOptions{.fOperatorTable = parser->fOperatorTable,
+                     .fCopyStrings = parser->fCopyStrings != 0,
+                     .fSkipWhitespaceLines = parser->fSkipWhitespaceLines != 0,
+                     .fRemoveComments = parser->fRemoveComments != 0,
+                     .fIncludeLineText = parser->fIncludeLineText != 0};
 }

@@ -4,6 +4,7 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
+#include "assembly/line_parts.h"
 #include "tokenizer/operator_table.h"
 
 struct LogicalLineParser {
@@ -22,3 +23,6 @@ extern PyTypeObject LogicalLineParserType;
 // the exception of the first truth test that raises.
 PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObject* removeComments,
                     PyObject* includeLineText);
+
+// The options of a parser, as the reader takes them.
+ReadOptions ParserOptions(PyObject* parser);

@@ -16,14 +16,6 @@
 
 namespace {
 
-ReadOptions OptionsOf(const LogicalLineParser* parser) {
-  return ReadOptions{.fOperatorTable = parser->fOperatorTable,
-                     .fCopyStrings = parser->fCopyStrings != 0,
-                     .fSkipWhitespaceLines = parser->fSkipWhitespaceLines != 0,
-                     .fRemoveComments = parser->fRemoveComments != 0,
-                     .fIncludeLineText = parser->fIncludeLineText != 0};
-}
-
 // Reads logical lines into `list` until the stop line (-1: none). Returns 0, or -1.
 int ReadLines(ReadingState* state, int64_t stop, PyObject* list) {
   while (!(stop != -1 && state->fLineNumber >= stop) && !state->fAtEnd) {
@@ -49,7 +41,7 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
   PyRef list = PyRef::Steal(PyList_New(0));
   if (!list) return nullptr;
   ReadingState state;
-  if (InitReadingState(&state, OptionsOf(reinterpret_cast<LogicalLineParser*>(self)), readline,
+  if (InitReadingState(&state, ParserOptions(self), readline,
                        data, dataEnd, firstLine) != 0)
     return nullptr;
   // Counted in 64 bits, so that no sum of the two arguments wraps; -1 means no stop line.
@@ -101,9 +93,8 @@ PyObject* GetLogicalLineListFromBuffer(PyObject* self, PyObject* args) {
 
 }  // namespace
 
-PyMethodDef kParserMethods[] = {
-    {"GetLogicalLineList", GetLogicalLineList, METH_VARARGS, kGetLogicalLineListDoc},
-    {"GetLogicalLineListFromBuffer", GetLogicalLineListFromBuffer, METH_VARARGS,
-     kGetLogicalLineListFromBufferDoc},
-    {nullptr, nullptr, 0, nullptr},
-};
+const PyMethodDef kGetLogicalLineListMethod = {"GetLogicalLineList", GetLogicalLineList,
+                                               METH_VARARGS, kGetLogicalLineListDoc};
+const PyMethodDef kGetLogicalLineListFromBufferMethod = {
+    "GetLogicalLineListFromBuffer", GetLogicalLineListFromBuffer, METH_VARARGS,
+    kGetLogicalLineListFromBufferDoc};

@@ -1,7 +1,8 @@
-// The parser's method table: GetLogicalLineList, the reading loop.
+// The parser's reading methods: GetLogicalLineList and GetLogicalLineListFromBuffer.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
-extern PyMethodDef kParserMethods[];
+extern const PyMethodDef kGetLogicalLineListMethod;
+extern const PyMethodDef kGetLogicalLineListFromBufferMethod;

@@ -118,6 +118,14 @@ class LogicalLineParser:
     def GetLogicalLineListFromBuffer(
         self, data: Buffer, first_line: int = 0, line_count: int = -1, /
     ) -> list[LogicalLine]: ...
+    # After an edit that replaced old_count physical lines from first_line (0-based) with
+    # new_count lines, makes `lines` (a full read of the old text by this parser) what a full
+    # read of `data` gives, re-reading only what the edit touched. Returns (index, removed,
+    # added): lines[index:index + len(added)] is added, in place of `removed` old lines.
+    def UpdateLogicalLineList(
+        self, lines: list[LogicalLine], data: Buffer, first_line: int, old_count: int,
+        new_count: int, /
+    ) -> tuple[int, int, list[LogicalLine]]: ...
 
 @type_check_only
 class CreateHook(Protocol):

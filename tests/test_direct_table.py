@@ -33,6 +33,7 @@ def test_capsules_and_the_empty_record():
     for entry in (("x", object()), "y", ()):
         assert DIRECT.AppendAttribDirect(line, entry) == 0
     assert DIRECT.GetNamesDefined(line) == line.fNamesDefined == ("x", "y", ())
+    assert DIRECT.GetArgNameCount(line) == 0  # attributes are no argument names
 
 
 @pytest.mark.parametrize("entry, accepted_on, view, refused_on, message", [

@@ -43,7 +43,18 @@ logicalline.SetLogicalCreateFunction(hook)
 assert outcome(b"x\ny\nz\n") == "KeyError"
 assert outcome(b"x = '\xff'\n") == "UnicodeDecodeError" and len(calls) == 2
 assert len(read(b"x = '\xff'\n", include_line_text=False)) == 1
+lines = logicalline.CreateLogicalLineParser().GetLogicalLineList(io.BytesIO(b"x\n").readline)
+try:  # the lines are the hook's objects now, which no update can know
+    logicalline.CreateLogicalLineParser().UpdateLogicalLineList(lines, b"y\n", 0, 1, 1)
+except TypeError:
+    pass
+else:
+    raise AssertionError("update with a hook installed")
+import weakref
+gone = weakref.ref(hook)
 logicalline.SetLogicalCreateFunction(42)
+del hook
+assert gone() is None  # a replaced hook is released
 assert read(b"\n  \n") == []  # nothing to construct
 assert outcome(b"x = 1\n") == "TypeError"
 ''', "hooks that read or replace themselves": r'''

@@ -85,6 +85,9 @@ def parsing():
         attempt(parser.GetLogicalLineListFromBuffer, bytearray(SOURCE), *window)
     for data in (memoryview(SOURCE)[5:], b"x\n\x00", "x", None):
         attempt(parser.GetLogicalLineListFromBuffer, data)
+    lines = parser.GetLogicalLineListFromBuffer(SOURCE)
+    for edit in ((3, 2, 1), (0, 30, 0), (1, 0, 40), (-1, 0, 0)):  # the last two are refused
+        attempt(parser.UpdateLogicalLineList, lines, SOURCE.replace(b"\n", b"\n\n", 1), *edit)
     attempt(logicalline.CreateLogicalLineParser, UNTRUTHFUL)
 
 

@@ -16,8 +16,8 @@ def texts(line):
 
 @pytest.mark.parametrize("source, tokens", [
     (b"a<>b x->y a:=1\n", ["a", "!=", "b", "x", "->", "y", "a", ":=", "1"]),
-    (b"0x1F 1e-5 1_000 0x_FF 1.2.3 5j 10L 0x1e+5\n",
-     ["0x1F", "1e-5", "1_000", "0x_FF", "1.2.3", "5j", "10L", "0x1e+5"]),
+    (b"0x1F 1E-5 1_000 0x_FF 1.2.3 5j 10L 0x1e+5\n",
+     ["0x1F", "1E-5", "1_000", "0x_FF", "1.2.3", "5j", "10L", "0x1e+5"]),
     (b"rb'x' bu'x' Rb'' fR'y'\n", ["rb'x'", "bu", "'x'", "Rb''", "fR'y'"]),
     ("été x² a\U0001F600\n".encode(), ["été", "x²", "a", "<errortoken> \U0001F600"]),
     (b"\x0c\x0bx $ ? !\n", ["x", "<errortoken> $", "<errortoken> ?", "<errortoken> !"]),

@@ -2,6 +2,8 @@
 // line text, which holds every physical line of the logical line in one buffer.
 #include "tokenizer/line_scanner.h"
 
+#include <cstring>
+
 #include "core/token_ids.h"
 #include "tokenizer/code_units.h"
 
@@ -73,8 +75,10 @@ const char* ScanNumber(const char* p, const char* end) {
 const char* ScanStringBody(ScanState* state, const ScanCursor* cursor, const char* from) {
   const char quote = state->fQuote;
   const char* end = cursor->fLineEnd;
+  // Only quote bytes matter here, and strings (docstrings above all) are long: jump to each.
   for (const char* p = from; p < end; p++) {
-    if (*p != quote) continue;
+    p = static_cast<const char*>(memchr(p, quote, static_cast<size_t>(end - p)));
+    if (!p) break;
     const char* k = p;
     if (state->fTriple) {
       if (p - from < 2 || p[-1] != quote || p[-2] != quote) continue;

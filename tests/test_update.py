@@ -1,0 +1,95 @@
+"""UpdateLogicalLineList: after any sequence of edits the list is what a full read of the text
+gives, and every line outside the replaced slice is the same object, annotations and all."""
+import os
+import random
+
+import pytest
+from hypothesis import given, settings, strategies as st
+
+import logicalline
+from test_model_agreement import STDLIB
+
+PARSER = logicalline.CreateLogicalLineParser()
+# Lines that open and close strings and brackets, continue with backslashes, start statements
+# inside brackets, and a byte-order mark that counts only at the very start.
+PIECES = [b"x = 1\n", b"def f(a,\n", b"  b):\n", b"    return a\n", b"'''\n", b"s = '''doc\n",
+          b")\n", b"]\n", b"\n", b"   \n", b"# c\n", b"y = (1 \\\n", b"if x:\n", b"else: y\n",
+          b"@d\n", b"class C:\n", b"z = [i for i in y\n", b"    if i]\n", b"\xef\xbb\xbfq\n",
+          b"t = 'open\n", b"u = 'a\\\n", b"\tpass\n"]
+
+
+def view(lines):
+    return [(x.fType, x.fFirstLine, x.fLineCount, x.fIndentLevel, x.fTabsInIndent,
+             x.fSpacesInIndent, x.fIncomplete, x.fLocalScopeName, x.fTokens, x.fLineText)
+            for x in lines]
+
+
+def edit(doc, lines, first, old_count, new, open_end=False):
+    """Replaces doc[first:first + old_count] by `new` and updates `lines` to match; the last
+    line loses its line break when open_end is set. Checks the contract; returns the new doc."""
+    text = doc[:first] + new + doc[first + old_count:]
+    if text and (open_end or not text[-1].endswith(b"\n")):
+        text[-1] = text[-1].rstrip(b"\n")
+        text = text if text[-1] else text[:-1]  # a line break alone is no line without it
+    for i, line in enumerate(text[:-1]):  # only the last line may lack its line break
+        text[i] = line if line.endswith(b"\n") else line + b"\n"
+    # A line whose line break came or went is edited too: widen the range to every change.
+    same = next((i for i, (a, b) in enumerate(zip(doc, text)) if a != b), min(len(doc), len(text)))
+    first = min(first, same)
+    tail = next((i for i, (a, b) in enumerate(zip(doc[::-1], text[::-1])) if a != b),
+                min(len(doc), len(text)))
+    tail = min(tail, len(doc) - first, len(text) - first)  # no line is both kept prefix and suffix
+    end = max(first + old_count, len(doc) - tail, first)
+    old_count, new = end - first, text[first:end + len(text) - len(doc)]
+    before = list(lines)
+    for line in before:
+        line.SetScopeName(line)  # an annotation that must stay with the object
+    index, removed, added = PARSER.UpdateLogicalLineList(lines, b"".join(text), first,
+                                                         old_count, len(new))
+    assert view(lines) == view(PARSER.GetLogicalLineListFromBuffer(b"".join(text)))
+    assert lines[index:index + len(added)] == added and len(lines) == len(before) - removed + len(added)
+    kept = before[:index] + before[index + removed:]
+    assert all(a is b and a.fScopeName is a for a, b in zip(lines[:index] + lines[index + len(added):], kept))
+    return text
+
+
+@settings(max_examples=150, deadline=None)
+@given(st.lists(st.sampled_from(PIECES), max_size=12),
+       st.lists(st.tuples(st.floats(0, 1), st.integers(0, 3),
+                          st.lists(st.sampled_from(PIECES), max_size=3), st.booleans()),
+                max_size=8))
+def test_random_edits(doc, edits):
+    lines = PARSER.GetLogicalLineListFromBuffer(b"".join(doc))
+    for where, old_count, new, open_end in edits:
+        first = int(where * len(doc))
+        doc = edit(doc, lines, first, min(old_count, len(doc) - first), new, open_end)
+    doc = edit(doc, lines, 0, len(doc), [])  # the whole text deleted, then written again
+    edit(doc, lines, 0, 0, PIECES)
+
+
+@pytest.mark.parametrize("name", ["inspect.py", "tokenize.py", "textwrap.py"])
+def test_edits_of_real_files(name):
+    with open(os.path.join(STDLIB, name), "rb") as f:
+        doc = f.read().splitlines(keepends=True)
+    lines, rng = PARSER.GetLogicalLineListFromBuffer(b"".join(doc)), random.Random(name)
+    for _ in range(40):
+        first = rng.randrange(len(doc) + 1)
+        old_count = min(rng.randrange(3), len(doc) - first)
+        doc = edit(doc, lines, first, old_count, rng.sample(doc, rng.randrange(3)))
+
+
+@pytest.mark.parametrize("args, error", [
+    ((b"x = 1\ny = 2\n", 3, 0, 0), ValueError),  # past the end of the text
+    ((b"x = 1\ny = 2\n", 1, 1, 2), ValueError),  # more new lines than the text has
+    ((b"x = 1\n", 0, 0, 0), ValueError),         # the lines run past the old text
+    ((b"x = 1\ny = 2\nz\x00\n", 2, 0, 1), ValueError),
+    ((b"x = 1\ny = 2\n", -1, 0, 0), ValueError),
+    (("x = 1\ny = 2\n", 0, 0, 0), TypeError),
+])
+def test_refusals_leave_the_list_alone(args, error):
+    lines = PARSER.GetLogicalLineListFromBuffer(b"x = 1\ny = 2\n")
+    before = list(lines)
+    pytest.raises(error, PARSER.UpdateLogicalLineList, lines, *args)
+    assert lines == before and [line.fFirstLine for line in lines] == [0, 1]
+    for bad in (tuple(lines), lines + ["x"]):
+        pytest.raises(TypeError, PARSER.UpdateLogicalLineList, bad, b"x = 1\ny = 2\n", 0, 0, 0)
