@@ -1,6 +1,8 @@
 #!/usr/bin/env bash
-# Fuzzes the module for SECONDS (default 60), split over three targets: reading without and with
-# a create hook (fuzz_reading.py), and the operations on the resulting lines (fuzz_lines.py).
+# Fuzzes the module for SECONDS (default 60), split over four targets: reading without and with
+# a create hook (fuzz_reading.py, which also compares the buffer path with the readline path),
+# the operations on the resulting lines (fuzz_lines.py), and edits replayed with
+# UpdateLogicalLineList (fuzz_update.py).
 #
 #   bash fuzz/run.sh 600
 #
@@ -61,14 +63,15 @@ root = os.path.dirname(os.__file__)
 paths = sorted(os.path.join(d, n) for d, _, names in os.walk(root) for n in names
                if n.endswith(".py"))[::20]
 rng = random.Random(1)
-for target in ("reading", "reading-hook", "lines"):
+for target in ("reading", "reading-hook", "lines", "update"):
     os.makedirs(os.path.join(sys.argv[1], target))
 for i, path in enumerate(paths):
     with open(path, "rb") as f:
         source = f.read(4096)
     seeds = {"reading": bytes([rng.randrange(48), 0, 0, 0]) + source,
              "reading-hook": bytes([rng.randrange(48), 0, 0, rng.randrange(40)]) + source,
-             "lines": bytes([rng.randrange(16), 24]) + source + rng.randbytes(48)}
+             "lines": bytes([rng.randrange(16), 24]) + source + rng.randbytes(48),
+             "update": bytes([rng.randrange(16)]) + source + b"\xff\xfe" + rng.randbytes(30)}
     for target, seed in seeds.items():
         with open(os.path.join(sys.argv[1], target, "%04d" % i), "wb") as f:
             f.write(seed)
@@ -82,8 +85,8 @@ export PYTHONMALLOC=malloc
 export PYTHONPATH="$BUILD:$ROOT/python:$ROOT/fuzz"
 
 status=0
-share=$(( SECONDS_TOTAL / 3 > 1 ? SECONDS_TOTAL / 3 : 1 ))
-for target in reading reading-hook lines; do
+share=$(( SECONDS_TOTAL / 4 > 1 ? SECONDS_TOTAL / 4 : 1 ))
+for target in reading reading-hook lines update; do
   script="$ROOT/fuzz/fuzz_${target%-hook}.py"
   flags=()
   [[ $target == reading-hook ]] && flags=(--hook)
