@@ -1,9 +1,15 @@
 """--ops: the host operations on LogicalLine objects, per call, against a plain Python line
-doing the same bookkeeping."""
+doing the same bookkeeping.
+
+Every operation is a row of one table, and one body times them all: the calls of a run are
+prepared as a list of argument tuples, the line first, and the body makes each call in turn.
+"""
 
 import array
+import functools
 import gc
 import io
+import operator
 import os
 import sys
 import time
@@ -19,6 +25,12 @@ sys.path.insert(0, os.path.join(os.path.dirname(os.path.dirname(os.path.abspath(
 from model import ERROR, ERROR_PREFIX, token_id_for_start  # noqa: E402
 
 PREFIX_LENGTH = len(ERROR_PREFIX)
+CLASS_DEF = logicalline.kClassDef
+FUNCTION_DEF = logicalline.kFunctionDef
+# The module does not publish its line type by name; the table needs its methods.
+LogicalLine = type(logicalline.CreateLogicalLineParser().GetLogicalLineList(
+    io.BytesIO(b"pass\n").readline)[0])
+
 
 class PyLine:
     """A logical line kept in plain Python: the same fields, the same checks, lists for the
@@ -110,8 +122,57 @@ class PyLine:
         return self.tokens_tuple
 
 
-CLASS_DEF = logicalline.kClassDef
-FUNCTION_DEF = logicalline.kFunctionDef
+# ---------------------------------------------------------------------------------------------
+# The operations
+
+
+def each_token(count):
+    return [(i,) for i in range(count)]
+
+
+def every_line(*calls):
+    """The same calls on every line, whatever its length."""
+    return lambda count: calls
+
+
+def not_scope_start(line_type):
+    return line_type is not CLASS_DEF and line_type is not FUNCTION_DEF
+
+
+def is_function_def(line_type):
+    return line_type is FUNCTION_DEF
+
+
+def any_line(line_type):
+    return True
+
+
+KEPT = None  # the same lines in every run: the operation leaves them as they were
+MARKER = ("name", None)
+READ_TOKENS = operator.attrgetter("fTokens")
+
+# What is timed; the module's call and the plain-Python one, each taking the line first; the
+# type of fresh lines the calls are made on, or KEPT lines; the calls on a line of n tokens.
+OPERATIONS = [
+    ("GetTokenType(i)", LogicalLine.GetTokenType, PyLine.get_token_type, KEPT, each_token),
+    ("GetTokenString(i)", LogicalLine.GetTokenString, PyLine.get_token_string, KEPT,
+     each_token),
+    ("AppendAttrib(obj), fresh non-def lines", LogicalLine.AppendAttrib, PyLine.append_attrib,
+     not_scope_start, every_line((MARKER,))),
+    ("AppendArgName(obj) x3, fresh def lines", LogicalLine.AppendArgName,
+     PyLine.append_arg_name, is_function_def, every_line(("self",), ("other",), ("more",))),
+    ("AppendTypeEquiv(a, b), fresh lines", LogicalLine.AppendTypeEquiv,
+     PyLine.append_type_equiv, any_line, every_line(("a", "b"))),
+    ("Copy(), per line", LogicalLine.Copy, PyLine.copy, KEPT, every_line(())),
+    ("fTokens, first access per line", READ_TOKENS, operator.attrgetter("token_tuples"),
+     any_line, every_line(())),
+    ("fTokens, later access per line", READ_TOKENS, operator.attrgetter("token_tuples"), KEPT,
+     every_line(())),
+]
+
+
+# ---------------------------------------------------------------------------------------------
+# Timing
 
 
 def ops_sample(corpus, limit):
@@ -148,6 +209,36 @@ def time_per_call(runs, prepare, body):
     return best / calls * 1e9, calls
 
 
+def same_line(line):
+    return line
+
+
+def native_token_count(line):
+    return line.fTokenCount
+
+
+def python_token_count(line):
+    return len(line.tokens)
+
+
+def prepare_calls(operation, wanted, calls_on, make_fresh, kept, convert, count):
+    """The calls of one run of a row on one side, made outside the timing: fresh lines of the
+    wanted types are parsed again for each run, since the operation changes them."""
+    if wanted is KEPT:
+        lines = kept
+    else:
+        lines = [convert(line) for line in make_fresh() if wanted(line.fType)]
+    return operation, [(line, *args) for line in lines for args in calls_on(count(line))]
+
+
+def call_each(prepared):
+    """The one timed body: every prepared call in turn, returning how many it made."""
+    operation, calls = prepared
+    for args in calls:
+        operation(*args)
+    return len(calls)
+
+
 def run_ops(corpus, runs):
     parser = logicalline.CreateLogicalLineParser()
     sample = ops_sample(corpus, 2_000_000)
@@ -160,132 +251,23 @@ def run_ops(corpus, runs):
           f"lines, {total:,} tokens; the Python GetTokenType agrees with the module on "
           f"{100 * agree / total:.2f}% of tokens")
     print(f"best of {runs} runs; fresh lines are made before each run, outside the timing; "
-          "each figure includes the loop and the method lookup, the same for both columns")
-    print()
+          "each figure includes the loop and the call, the same for both columns\n")
 
-    def NativeFresh():
-        return fresh_lines(parser, sample)
-
-    def PythonFresh():
-        return [PyLine(line) for line in NativeFresh()]
-
-    def KeepNative():
-        return native
-
-    def KeepPython():
-        return python
-
-    def EachToken(method, count):
-        """A body that calls `method(i)` for every token index of every line."""
-        def Body(lines):
-            for line in lines:
-                get = getattr(line, method)
-                for i in range(count(line)):
-                    get(i)
-            return total
-        return Body
-
-    def NativeCount(line):
-        return line.fTokenCount
-
-    def PythonCount(line):
-        return len(line.tokens)
-
-    marker = ("name", None)
-
-    # The lines are sorted by type before the timing, so the loops hold the call alone.
-    def NativeFreshOf(wanted):
-        return lambda: [line for line in NativeFresh() if wanted(line.fType)]
-
-    def PythonFreshOf(wanted):
-        return lambda: [PyLine(line) for line in NativeFresh() if wanted(line.fType)]
-
-    def NotScopeStart(line_type):
-        return line_type is not CLASS_DEF and line_type is not FUNCTION_DEF
-
-    def IsFunctionDef(line_type):
-        return line_type is FUNCTION_DEF
-
-    def NativeAppendAttrib(lines):
-        for line in lines:
-            line.AppendAttrib(marker)
-        return len(lines)
-
-    def PythonAppendAttrib(lines):
-        for line in lines:
-            line.append_attrib(marker)
-        return len(lines)
-
-    def NativeAppendArgName(lines):
-        for line in lines:
-            append = line.AppendArgName
-            append("self")
-            append("other")
-            append("more")
-        return 3 * len(lines)
-
-    def PythonAppendArgName(lines):
-        for line in lines:
-            append = line.append_arg_name
-            append("self")
-            append("other")
-            append("more")
-        return 3 * len(lines)
-
-    def NativeAppendTypeEquiv(lines):
-        for line in lines:
-            line.AppendTypeEquiv("a", "b")
-        return len(lines)
-
-    def PythonAppendTypeEquiv(lines):
-        for line in lines:
-            line.append_type_equiv("a", "b")
-        return len(lines)
-
-    def NativeCopy(lines):
-        for line in lines:
-            line.Copy()
-        return len(lines)
-
-    def PythonCopy(lines):
-        for line in lines:
-            line.copy()
-        return len(lines)
-
-    def NativeTokens(lines):
-        for line in lines:
-            line.fTokens
-        return len(lines)
-
-    def PythonTokens(lines):
-        for line in lines:
-            line.token_tuples
-        return len(lines)
-
-    cases = [
-        ("GetTokenType(i)", KeepNative, EachToken("GetTokenType", NativeCount), KeepPython,
-         EachToken("get_token_type", PythonCount)),
-        ("GetTokenString(i)", KeepNative, EachToken("GetTokenString", NativeCount), KeepPython,
-         EachToken("get_token_string", PythonCount)),
-        ("AppendAttrib(obj), fresh non-def lines", NativeFreshOf(NotScopeStart),
-         NativeAppendAttrib, PythonFreshOf(NotScopeStart), PythonAppendAttrib),
-        ("AppendArgName(obj) x3, fresh def lines", NativeFreshOf(IsFunctionDef),
-         NativeAppendArgName, PythonFreshOf(IsFunctionDef), PythonAppendArgName),
-        ("AppendTypeEquiv(a, b), fresh lines", NativeFresh, NativeAppendTypeEquiv,
-         PythonFresh, PythonAppendTypeEquiv),
-        ("Copy(), per line", KeepNative, NativeCopy, KeepPython, PythonCopy),
-        ("fTokens, first access per line", NativeFresh, NativeTokens, PythonFresh,
-         PythonTokens),
-        ("fTokens, later access per line", KeepNative, NativeTokens, KeepPython,
-         PythonTokens),
-    ]
     # Warm both caches of fTokens for the "later access" row.
-    NativeTokens(native)
-    PythonTokens(python)
+    for line, py in zip(native, python):
+        line.fTokens
+        py.token_tuples
+    # Each side: its kept lines, how it makes a line of its own from a fresh native one, and
+    # how it counts a line's tokens.
+    sides = [(native, same_line, native_token_count), (python, PyLine, python_token_count)]
+    fresh = functools.partial(fresh_lines, parser, sample)
+
     print(f"{'operation':<42} {'calls':>9} {'module ns':>10} {'Python ns':>10} {'speedup':>8}")
-    for name, native_prepare, native_body, python_prepare, python_body in cases:
-        native_ns, calls = time_per_call(runs, native_prepare, native_body)
-        python_ns, _ = time_per_call(runs, python_prepare, python_body)
+    for name, native_call, python_call, wanted, calls_on in OPERATIONS:
+        figures = [time_per_call(runs, functools.partial(prepare_calls, call, wanted, calls_on,
+                                                         fresh, *side), call_each)
+                   for call, side in zip((native_call, python_call), sides)]
+        (native_ns, calls), (python_ns, _) = figures
         print(f"{name:<42} {calls:>9,} {native_ns:>10.1f} {python_ns:>10.1f} "
               f"{python_ns / native_ns:>7.1f}x")
 
@@ -301,5 +283,3 @@ def run_ops(corpus, runs):
           "Copy() also classifies the copy again")
     print("the Python column classifies tokens with the test suite's model (tests/model.py), "
           "which is written for clarity before speed")
-
-
