@@ -1,7 +1,7 @@
 """Speed and memory of logicalline against the tools a host would otherwise use.
 
     python3.10 bench/compare.py [CORPUS_DIR] [--runs N] [--slow-runs N]
-    python3.10 bench/compare.py [CORPUS_DIR] --ops
+    python3.10 bench/compare.py [CORPUS_DIR] --ops [--runs N]
 
 The corpus is read into memory before anything is timed. Without CORPUS_DIR it is every .py file
 of the running interpreter's standard library (the directory of os.__file__), leaving out
@@ -14,11 +14,16 @@ Default mode times, best of several runs in this one process:
   - ast.parse (files it rejects are skipped and counted);
   - parso's tokenizer, when parso is installed (pip install .[bench]);
   - a floor: every physical line split on blanks, one bytes object per chunk.
-Then the memory that the lists of lines keep per token, the cost per MB of a few shapes of
-source that stress one dimension each, and the targets.
+Then the targets, the cost per MB of a few shapes of source that stress one dimension each,
+and the memory that the lists of lines keep per token.
 
 --ops times the host operations on LogicalLine objects, per call, against a plain Python class
-doing the same bookkeeping.
+doing the same bookkeeping, whose tokens are classified by the test suite's model
+(tests/model.py).
+
+This file is the entry point and holds the default mode and its targets; corpus.py loads the
+corpus, contenders.py holds the timed bodies and the timing helpers, scaling.py the shapes of
+source, memory.py the retained memory, and host_ops.py the --ops table.
 
 Timing rules: time.perf_counter; gc.collect() runs between runs, outside the timed region; the
 cyclic collector stays enabled while a contender runs, as it would in a host. Fast contenders
