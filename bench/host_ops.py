@@ -150,6 +150,7 @@ def any_line(line_type):
 KEPT = None  # the same lines in every run: the operation leaves them as they were
 MARKER = ("name", None)
 READ_TOKENS = operator.attrgetter("fTokens")
+READ_TOKEN_TUPLES = operator.attrgetter("token_tuples")
 
 # What is timed; the module's call and the plain-Python one, each taking the line first; the
 # type of fresh lines the calls are made on, or KEPT lines; the calls on a line of n tokens.
@@ -164,10 +165,8 @@ OPERATIONS = [
     ("AppendTypeEquiv(a, b), fresh lines", LogicalLine.AppendTypeEquiv,
      PyLine.append_type_equiv, any_line, every_line(("a", "b"))),
     ("Copy(), per line", LogicalLine.Copy, PyLine.copy, KEPT, every_line(())),
-    ("fTokens, first access per line", READ_TOKENS, operator.attrgetter("token_tuples"),
-     any_line, every_line(())),
-    ("fTokens, later access per line", READ_TOKENS, operator.attrgetter("token_tuples"), KEPT,
-     every_line(())),
+    ("fTokens, first access per line", READ_TOKENS, READ_TOKEN_TUPLES, any_line, every_line(())),
+    ("fTokens, later access per line", READ_TOKENS, READ_TOKEN_TUPLES, KEPT, every_line(())),
 ]
 
 
