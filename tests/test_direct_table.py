@@ -84,25 +84,14 @@ def test_function_def_entries():
     assert line.fArgNames == tuple(objs) and DIRECT.GetArgNameCount(read(b"import f\n")[0]) == 0
 
 
-@pytest.mark.parametrize("entry, args, expected", [
-    ("GetTokenTypeDirect", (0, 0), 1), ("GetTokenTypeDirect", (2, 0), 201),
-    ("GetTokenTypeDirect", (2, 1), 3), ("GetTokenTypeDirect", (3, 0), IndexError),
-    ("GetStringTokenTypeDirect", (b"42", 0), 2), ("GetStringTokenTypeDirect", ("été", 0), 1),
-    ("GetStringTokenTypeDirect", (b"<errortoken> 'abc", 0), 201),
-    ("GetStringTokenTypeDirect", ("<errortoken> 'abc", 1), 3),
-    ("GetStringTokenTypeDirect", (b"<errortoken> ", 1), 201),  # nothing after the prefix
-    ("GetStringTokenTypeDirect", (b"<errortoken>", 1), 20),    # too short to hold the prefix
-    ("GetStringTokenTypeDirect", (bytearray(b"x"), 0), TypeError),
-    ("GetStringTokenTypeDirect", ("\ud800", 1), UnicodeEncodeError),
-])
-def test_token_type_entries(entry, args, expected):
-    if entry == "GetTokenTypeDirect":
-        args = (read(b"s = 'abc\n")[0], *args)
-    if isinstance(expected, int):
-        assert getattr(DIRECT, entry)(*args) == expected
-        return
-    with pytest.raises(expected) as info:
-        getattr(DIRECT, entry)(*args)
-    assert str(info.value) == {IndexError: "Invalid token index",
-                               TypeError: "String must be a bytes or unicode instance"}.get(
-        expected, str(info.value))
+def test_token_type_entries():
+    (line,) = read(b"s = 'abc\n")
+    assert [DIRECT.GetTokenTypeDirect(line, 2, skip) for skip in (0, 1)] == [201, 3]
+    assert [DIRECT.GetStringTokenTypeDirect(text, skip) for text, skip in [
+        (b"42", 0), ("\u00e9t\u00e9", 0), ("<errortoken> 'abc", 1), (b"<errortoken> ", 1),
+        (b"<errortoken>", 1)]] == [2, 1, 3, 201, 20]  # a bare prefix leaves nothing; too short
+    with pytest.raises(IndexError, match="^Invalid token index$"):
+        DIRECT.GetTokenTypeDirect(line, 3, 0)
+    with pytest.raises(TypeError, match="^String must be a bytes or unicode instance$"):
+        DIRECT.GetStringTokenTypeDirect(bytearray(b"x"), 0)
+    pytest.raises(UnicodeEncodeError, DIRECT.GetStringTokenTypeDirect, "\ud800", 1)

@@ -4,7 +4,8 @@ import pytest
 from test_model_agreement import run_isolated
 
 PRELUDE = r'''
-import io, logicalline
+import io, mmap, weakref, logicalline
+PARSER = logicalline.CreateLogicalLineParser()
 def read(source, *args, **options):
     parser = logicalline.CreateLogicalLineParser(**options)
     return parser.GetLogicalLineList(io.BytesIO(source).readline, *args)
@@ -14,7 +15,7 @@ def outcome(source, *args, **options):
     except Exception as e:
         return type(e).__name__
 '''
-SCRIPTS = {"raw parts": r'''
+SCRIPTS = {"raw parts and stand-in results": r'''
 plain = read(b"def f(a):\n")[0]
 plain.AppendArgName("a")
 calls = []
@@ -26,14 +27,9 @@ copied = plain.Copy()  # a copy bypasses the hook
 assert type(copied) is logicalline.LogicalLineType and copied.fArgNames == ("a",)
 logicalline.SetLogicalCreateFunction(lambda *parts: [parts[0], parts[8]])
 assert read(b" " * 40000 + b"x\n", include_line_text=False) == [[40000, None]]
-''', "results stand in": r'''
-source = b"def f(a,\n      b):\n\tf(1,\ndef g(): pass\n"
 odd = [None, 7, (), type, b"\xff"]
 logicalline.SetLogicalCreateFunction(lambda *parts: odd.pop(0))
-assert read(b"a\nb\nc\nd\ne\n") == [7, (), type, b"\xff"]
-marker = object()
-assert logicalline.SetLogicalCreateFunction(lambda *parts: marker) is None
-assert read(source) == [marker] * 3
+assert read(b"a\nb\nc\nd\ne\n") == [7, (), type, b"\xff"]  # None is dropped
 ''', "failures": r'''
 calls = []
 def hook(*parts):
@@ -43,21 +39,17 @@ logicalline.SetLogicalCreateFunction(hook)
 assert outcome(b"x\ny\nz\n") == "KeyError"
 assert outcome(b"x = '\xff'\n") == "UnicodeDecodeError" and len(calls) == 2
 assert len(read(b"x = '\xff'\n", include_line_text=False)) == 1
-lines = logicalline.CreateLogicalLineParser().GetLogicalLineList(io.BytesIO(b"x\n").readline)
 try:  # the lines are the hook's objects now, which no update can know
-    logicalline.CreateLogicalLineParser().UpdateLogicalLineList(lines, b"y\n", 0, 1, 1)
+    PARSER.UpdateLogicalLineList(read(b"x\n"), b"y\n", 0, 1, 1)
+    raise AssertionError("update with a hook installed")
 except TypeError:
     pass
-else:
-    raise AssertionError("update with a hook installed")
-import weakref
 gone = weakref.ref(hook)
 logicalline.SetLogicalCreateFunction(42)
 del hook
 assert gone() is None  # a replaced hook is released
-assert read(b"\n  \n") == []  # nothing to construct
-assert outcome(b"x = 1\n") == "TypeError"
-''', "hooks that read or replace themselves": r'''
+assert read(b"\n  \n") == [] and outcome(b"x = 1\n") == "TypeError"
+''', "hooks that read, replace themselves or change the buffer being read": r'''
 def nesting(*parts):
     return read(parts[8].encode(), parts[1] + 1) if parts[1] < 2 else parts[1]
 logicalline.SetLogicalCreateFunction(nesting)
@@ -68,8 +60,6 @@ def replacing(*parts):
 logicalline.SetLogicalCreateFunction(replacing)
 del replacing
 assert read(b"a\nb\n") == ["first", "second"]
-''', "hooks that try to change the buffer being read": r'''
-import mmap
 data, mapped = bytearray(b"x = 1\ny = (2,\n 3)\n"), mmap.mmap(-1, 8)
 mapped.write(b"a\nb\nc\nd\n")
 def changing(*parts):
@@ -79,11 +69,10 @@ def changing(*parts):
     except BufferError:
         return parts[1]
 logicalline.SetLogicalCreateFunction(changing)
-parser = logicalline.CreateLogicalLineParser()
 change = lambda: data.extend(b"z\n")
-assert parser.GetLogicalLineListFromBuffer(data) == [0, 1]
+assert PARSER.GetLogicalLineListFromBuffer(data) == [0, 1]
 change = mapped.close
-assert parser.GetLogicalLineListFromBuffer(mapped, 7) == [7, 8, 9, 10]
+assert PARSER.GetLogicalLineListFromBuffer(mapped, 7) == [7, 8, 9, 10]
 data.extend(b"w\n")  # free again once the call is over
 mapped.close()
 '''}

@@ -91,43 +91,35 @@ def parsing():
     attempt(logicalline.CreateLogicalLineParser, UNTRUTHFUL)
 
 
-def methods():
-    for line in read():
+def methods_and_entries():
+    lines = read() + [DIRECT.CreateEmptyLogical()]
+    for line in lines:
         for i, skip in itertools.product((0, 5, -1, 99), (0, 1)):
             attempt(line.GetTokenType, i, skip_error_prefix=skip)
             attempt(line.GetTokenString, i, skip)
+            attempt(DIRECT.GetTokenTypeDirect, line, i, skip)
         attempt(line.GetTokenType, "0")
         for name in ("AppendAttrib", "AppendArgName", "AppendBaseClassName", "AppendTypeEquiv",
                      "AppendArgTypeEquiv", "SetScopeName", "SetParsed"):
             attempt(getattr(line, name), *STORED[:2 if "Equiv" in name else 1])
+            if name.startswith("Append"):
+                attempt(getattr(DIRECT, name + "Direct"), line, *STORED[1:3 if "Equiv" in name else 2])
         attempt(line.SetParsed, UNTRUTHFUL)
         attempt(line.SetLineRange, 2**40, 1)
-        copy.deepcopy(line).Copy(1, 2, 3)
+        attempt(DIRECT.GetArgName, line, 0)
+        DIRECT.IsLogical(line), DIRECT.GetArgNameCount(line), DIRECT.GetNamesDefined(line)
+        attempt(lambda: copy.deepcopy(line).Copy(1, 2, 3))
         line.SetLineRange(0, 0)
         attempt(line.Copy)
-    logicalline.GetIdForTokenStart(b"<<=")
-    logicalline._GetFirstCodeUnit("\U0001f600")
-    attempt(logicalline.GetIdForTokenStart, 5)
-
-
-def direct_entries():
-    lines = [DIRECT.CreateEmptyLogical(), *read(b"class C: pass\ndef f(a): pass\nx = 1\n")]
-    DIRECT.GetLogicalTypeObject()
-    for line in lines:
-        for entry, args in (
-                (DIRECT.AppendTypeEquivDirect, STORED[:2]), (DIRECT.AppendAttribDirect, STORED[:1]),
-                (DIRECT.AppendArgTypeEquivDirect, STORED[1:]), (DIRECT.GetArgName, (5,)),
-                (DIRECT.AppendArgNameDirect, STORED[1:2]), (DIRECT.GetArgName, (0,)),
-                (DIRECT.AppendBaseClassNameDirect, STORED[2:]),
-                (DIRECT.GetTokenTypeDirect, (0, 1)), (DIRECT.GetTokenTypeDirect, (9, 0))):
-            attempt(entry, line, *args)
-        DIRECT.IsLogical(line), DIRECT.GetArgNameCount(line), DIRECT.GetNamesDefined(line)
         DIRECT.ClearAppended(line)
-    for text in (b"<errortoken> 'x", "name", "\udc80", None):
+    for text in (b"<errortoken> 'x", "name", "\udc80", None, b"<<="):
         attempt(DIRECT.GetStringTokenTypeDirect, text, 1)  # "\udc80": UnicodeEncodeError
+        attempt(logicalline.GetIdForTokenStart, text)
+        attempt(logicalline._GetFirstCodeUnit, text)
+    DIRECT.GetLogicalTypeObject()
 
 
-@pytest.mark.parametrize("operation", [parsing, methods, direct_entries])
+@pytest.mark.parametrize("operation", [parsing, methods_and_entries])
 def test_operation_leaks_nothing(operation):
     assert_no_growth(operation)
 

@@ -152,28 +152,6 @@ def test_hostile_inputs(block):
             assert_agreement(hostile_chunks(seed, nul=seed % 8 == 0), opts, *window)
 
 
-def hook_agreement():
-    """Compares the raw parts that reach a create hook; returns the number of differences."""
-    logicalline.SetLogicalCreateFunction(lambda *parts: parts)
-    failures = 0
-    for seed, opts in itertools.product(range(1000), [(1, 0, 0, 0), (0, 1, 1, 1)]):
-        chunks = hostile_chunks(seed)
-        want = [(m["indent"], m["first_line"], m["line_count"], tuple(m["tokens"]),
-                 tuple(m["positions"]), m["spaces"], m["tabs"], m["incomplete"],
-                 text_view(m["line_text"])) for m in model.model_lines(chunks, *opts)]
-        if "<undecodable>" in [w[8] for w in want]:
-            want = "UnicodeDecodeError"  # the hook is never called with undecodable text
-        try:
-            got = logicalline.CreateLogicalLineParser(*opts).GetLogicalLineList(
-                iter(chunks + [b""]).__next__)
-        except UnicodeDecodeError:
-            got = "UnicodeDecodeError"
-        if got != want:
-            failures += 1
-            print(f"seed {seed}, options {opts}: {chunks!r}\nmodule: {got!r}\nmodel:  {want!r}")
-    return failures
-
-
 def run_isolated(code):
     """Runs code in a fresh interpreter (a create hook stays for the life of the process) with
     this directory and the module importable; returns the finished process."""
@@ -182,9 +160,3 @@ def run_isolated(code):
     return subprocess.run([sys.executable, "-c", code], capture_output=True, text=True,
                           errors="replace", timeout=300,
                           env=dict(os.environ, PYTHONPATH=os.pathsep.join(path)))
-
-
-def test_create_hook_receives_raw_parts():
-    done = run_isolated("import sys, test_model_agreement as t; "
-                        "sys.exit(min(t.hook_agreement(), 100))")
-    assert done.returncode == 0, done.stdout[-4000:] + done.stderr[-4000:]

@@ -39,15 +39,11 @@ def test_first_code_unit(data, unit):
     assert type(result) is str and len(result) == 1 and ord(result) == unit
 
 
-@pytest.mark.parametrize("function", [logicalline.GetIdForTokenStart,
-                                      logicalline._GetFirstCodeUnit])
-@pytest.mark.parametrize("args, error", [
-    ((), TypeError), ((b"a", b"b"), TypeError), ((None,), TypeError),
-    ((bytearray(b"a"),), TypeError), (("\ud800",), UnicodeEncodeError),
-])
-def test_argument_errors(function, args, error):
-    with pytest.raises(error):
-        function(*args)
+def test_argument_errors():
+    for function in (logicalline.GetIdForTokenStart, logicalline._GetFirstCodeUnit):
+        for args in ((), (b"a", b"b"), (None,), (bytearray(b"a"),)):
+            pytest.raises(TypeError, function, *args)
+        pytest.raises(UnicodeEncodeError, function, "\ud800")
 
 
 def test_short_and_random_inputs_match_model(request):
@@ -80,12 +76,10 @@ def test_token_kind_and_text(source, index, kind, kind_skipped, text, text_skipp
 
 
 @pytest.mark.parametrize("method", ["GetTokenType", "GetTokenString"])
-@pytest.mark.parametrize("args, kwargs, error", [
-    ((-1,), {}, IndexError), ((3,), {}, IndexError), (("0",), {}, TypeError),
-    ((0,), {"skip": 1}, TypeError), ((2 ** 40,), {}, OverflowError),
-])
-def test_bad_token_arguments(method, args, kwargs, error):
-    (line,) = read(b"x = 1\n")
-    with pytest.raises(error) as info:
-        getattr(line, method)(*args, **kwargs)
-    assert error is not IndexError or str(info.value) == "Invalid token index"
+def test_bad_token_arguments(method):
+    call = getattr(read(b"x = 1\n")[0], method)
+    for index in (-1, 3):
+        pytest.raises(IndexError, call, index).match("^Invalid token index$")
+    for args, kwargs, error in [(("0",), {}, TypeError), ((0,), {"skip": 1}, TypeError),
+                                ((2 ** 40,), {}, OverflowError)]:
+        pytest.raises(error, call, *args, **kwargs)
