@@ -2,7 +2,6 @@
 reads, and reading a file's logical lines in windows so that no whole file's lines are held."""
 
 import array
-import codecs
 import io
 import os
 import re
@@ -53,12 +52,10 @@ def to_utf8(data):
     try:
         encoding, _ = tokenize.detect_encoding(io.BytesIO(data).readline)
     except SyntaxError:  # an unknown codec, or first lines that are not UTF-8: keep the bytes
-        encoding = "utf-8"
-    if data.startswith(codecs.BOM_UTF8):
-        return data[len(codecs.BOM_UTF8):]
+        return data
     if encoding == "utf-8":
         return data  # malformed bytes stay, for the module to show as U+FFFD
-    return data.decode(encoding, "replace").encode()
+    return data.decode(encoding, "replace").encode()  # "utf-8-sig" drops the byte-order mark
 
 
 def read_lines(parser, data, offset, first_line, line_count):
