@@ -147,7 +147,8 @@ def main(argv=None):
         else:
             out.flush()  # before the workers start, so that they inherit no pending output
             results = dump_parallel(parser, settings, style, sources, options.jobs, emit)
-        for path, stat_size, (read, failure) in zip(sources, sizes, results):
+        # Results first: zip then runs them to their end, which shuts the workers down.
+        for (read, failure), path, stat_size in zip(results, sources, sizes):
             display.file_done(stat_size)
             if failure:
                 fail(path, failure)
