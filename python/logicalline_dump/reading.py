@@ -17,21 +17,22 @@ WINDOW = 20000
 def find_sources(paths, fail):
     """Returns the inputs in dump order: files as given, directories walked for *.py in sorted
     order. A directory that cannot be listed, or holds no .py file, goes to `fail` instead."""
-    sources = []
+    sources, unlisted = [], []
+
+    def unlistable(error):
+        unlisted.append(error.filename)
+        fail(error.filename, f"cannot read {error.filename}: {error.strerror or error}")
+
     for path in paths:
         if path == STDIN or not os.path.isdir(path):
             sources.append(path)
             continue
-        found = len(sources)
-
-        def unlistable(error):
-            fail(error.filename, f"cannot read {error.filename}: {error.strerror or error}")
-
+        found, failed = len(sources), len(unlisted)
         for root, dirs, files in os.walk(path, onerror=unlistable):
             dirs.sort()
             sources.extend(os.path.join(root, name) for name in sorted(files)
                            if name.endswith(".py"))
-        if len(sources) == found:
+        if len(sources) == found and len(unlisted) == failed:  # an unlistable one is told once
             fail(path, f"no .py files in {path}")
     return sources
 
