@@ -8,7 +8,7 @@ import sys
 import pytest
 
 import logicalline
-from logicalline_dump import progress, reading
+from logicalline_dump import dump, progress, reading
 from logicalline_dump.__main__ import PARSER_OPTIONS, main
 
 # Tab indent, a line cut short by the next statement, a scope name, a byte that is not UTF-8.
@@ -102,7 +102,8 @@ def test_windows_give_what_one_read_gives(window, options):
 
 
 @pytest.mark.parametrize("style", [["--json"], []])
-def test_jobs_write_what_a_serial_run_writes(tree, capsys, style):
+def test_jobs_write_what_a_serial_run_writes(tree, capsys, monkeypatch, style):
+    monkeypatch.setattr(dump, "BIG", 20000)  # the bigger files stream from this process
     for number in range(12):  # sizes that make the workers finish out of order
         pathlib.Path(f"f{number}.py").write_bytes(CLOSED * (number % 5) * 100)
     inputs = ["nul.py", "ok.py", ".", "bad.py", "missing.py"]

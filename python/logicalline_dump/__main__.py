@@ -146,7 +146,8 @@ def main(argv=None):
             results = (dump_file(parser, style, path, emit, display.moved) for path in sources)
         else:
             out.flush()  # before the workers start, so that they inherit no pending output
-            results = dump_parallel(parser, settings, style, sources, options.jobs, emit)
+            results = dump_parallel(parser, settings, style, sources, sizes, options.jobs,
+                                    emit, display.moved)
         # Results first: zip then runs them to their end, which shuts the workers down.
         for (read, failure), path, stat_size in zip(results, sources, sizes):
             display.file_done(stat_size)

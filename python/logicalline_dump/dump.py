@@ -10,6 +10,8 @@ import logicalline
 
 from .reading import STDIN, load, to_utf8, windows
 
+BIG = 1 << 20  # bytes of a file too big to gather its whole output in a worker
+
 # Line type constants by their bytes value, for printing.
 LINE_TYPE_NAMES = {
     getattr(logicalline, name): name
@@ -88,6 +90,10 @@ def collect(parser, style, path):
     return (pieces, *dump_file(parser, style, path, pieces.append))
 
 
+def stream(parser, style, path, emit, moved):
+    return ([], *dump_file(parser, style, path, emit, moved))
+
+
 worker_parser = None  # one per worker process, made once
 
 
@@ -100,10 +106,11 @@ def collect_in_worker(style, path):
     return collect(worker_parser, style, path)
 
 
-def dump_parallel(parser, settings, style, sources, jobs, emit):
+def dump_parallel(parser, settings, style, sources, sizes, jobs, emit, moved):
     """Yields (size, failure) per input in order, as dump_file returns them, having handed the
-    input's output to emit. Each input is dumped whole in a worker process; a few run ahead of
-    the one being written, no more, so that memory stays bounded."""
+    input's output to emit. A worker process dumps an input whole and this one writes it; a few
+    run ahead of the one being written, no more. Stdin, which only this process has, and files
+    over BIG bytes, whose whole output would weigh on memory, are streamed here in their turn."""
     with concurrent.futures.ProcessPoolExecutor(
             jobs, initializer=start_worker, initargs=(settings,)) as pool:
         pending = collections.deque()
@@ -115,9 +122,9 @@ def dump_parallel(parser, settings, style, sources, jobs, emit):
             return size, failure
 
         try:
-            for path in sources:
-                if path == STDIN:  # only this process has our stdin; read it in its turn
-                    pending.append(functools.partial(collect, parser, style, path))
+            for path, size in zip(sources, sizes):
+                if path == STDIN or size > BIG:
+                    pending.append(functools.partial(stream, parser, style, path, emit, moved))
                 else:
                     pending.append(pool.submit(collect_in_worker, style, path).result)
                 if len(pending) > 2 * jobs:
