@@ -9,8 +9,8 @@ Line numbers count from 1 everywhere: in the text, the JSON and the error messag
 are byte offsets from 0 into the line's UTF-8 text.
 
 The text output gives "== PATH", then two rows per logical line:
-    12 +2   indent 4   spaces             kFunctionDef       area
-        'def'@12:4  'area'@12:8  '('@12:12  'w'@12:13  ','@12:14  'h'@13:9  ...
+   12 +2   indent 4   spaces             kFunctionDef       area
+        'def'@12:4  'area'@12:8  '('@12:12  'self'@12:13  ','@12:17  'w'@12:19  ...
 that is: first line, +the physical lines it spans, indent width (tabs advance to the next
 multiple of 8), flags (tabs and/or spaces in the indent; incomplete: it ended while still
 open), line type, and the name that a class or function definition defines; then each token as
@@ -32,8 +32,8 @@ left; a bar with pip install 'logicalline[tools]'), unless --quiet or stdout is 
 too and the dump would scroll it away.
 
 Exit status: 0 when every input was dumped, 1 when any could not be read or parsed, or a
-directory held no .py file (each is reported on stderr, and the rest are still dumped), 2 for a
-usage error. Output cut short by a closed pipe ends quietly with status 141, as for other
+directory held no .py file (each is reported on stderr, after what was dumped of it, and the
+rest are still dumped), 2 for a usage error. Output cut short by a closed pipe ends quietly with status 141, as for other
 filters.
 """
 
