@@ -2,8 +2,8 @@
 
 With no argument it dumps a bundled sample; given files or directories (walked for *.py), it
 dumps each one, and "-" reads a source from stdin. A file is decoded as the interpreter would
-(byte-order mark, coding declaration, else UTF-8) and read as UTF-8. Big files are read in
-windows of physical lines, so memory stays flat whatever their size.
+(byte-order mark, coding declaration, else UTF-8) and read as UTF-8, in windows of physical
+lines: memory stays near the size of the biggest file, not many times it.
 
 Line numbers count from 1 everywhere: in the text, the JSON and the error messages. Columns
 are byte offsets from 0 into the line's UTF-8 text.
