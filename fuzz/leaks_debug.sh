@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
 # Exact leak checks: builds the module against Debian's debug interpreter (python3.11-dbg, which
-# has sys.gettotalrefcount) in build-dbg and runs tests/test_leaks.py there with --leaks.
+# has sys.gettotalrefcount) in build-dbg and runs tests/test_leaks.py there.
 # Installs python3.11-dbg, its headers and pytest with apt-get when they are missing.
 #
 #   bash fuzz/leaks_debug.sh
@@ -29,5 +29,4 @@ cmake --build "$BUILD" -j 2 > "$BUILD/build.log" 2>&1 || { cat "$BUILD/build.log
 cd "$ROOT"
 PYTHONPATH="$BUILD:$ROOT/python" "$PYTHON" -c \
   'import logicalline, sys; assert "build-dbg" in logicalline.__file__ and sys.gettotalrefcount()'
-PYTHONPATH="$BUILD:$ROOT/python" "$PYTHON" -m pytest -q -p no:cacheprovider tests/test_leaks.py \
-  --leaks "$@"
+PYTHONPATH="$BUILD:$ROOT/python" "$PYTHON" -m pytest -q -p no:cacheprovider tests/test_leaks.py "$@"

@@ -62,13 +62,7 @@ def to_utf8(data):
 def read_lines(parser, data, offset, first_line, line_count):
     """The one call into the module: the logical lines of data[offset:], numbered from
     first_line, that start within line_count physical lines."""
-    return parser.GetLogicalLineList(readline_from(data, offset), first_line, line_count)
-
-
-def readline_from(data, offset):
-    stream = io.BytesIO(data)  # shares the bytes of `data` rather than copying them
-    stream.seek(offset)
-    return stream.readline
+    return parser.GetLogicalLineListFromBuffer(memoryview(data)[offset:], first_line, line_count)
 
 
 def windows(parser, data, window=WINDOW):
