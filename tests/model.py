@@ -41,12 +41,10 @@ def first_code_unit(b, p=0, end=None):
     """Low 16 bits of the first character's code point; 0 when it cannot be decoded."""
     end = len(b) if end is None else end
     b0 = b[p] if p < end else 0
-    if b0 < 0x80:
-        return b0
-    n = 0 if b0 < 0xC0 or b0 >= 0xF8 else 2 if b0 < 0xE0 else 3 if b0 < 0xF0 else 4
+    n = 1 if b0 < 0x80 else 0 if b0 < 0xC0 or b0 >= 0xF8 else 2 if b0 < 0xE0 else 3 if b0 < 0xF0 else 4
     tail = b[p + 1:p + n]
-    if n == 0 or end - p < n or any(c & 0xC0 != 0x80 for c in tail):
-        return 0
+    if n < 2 or end - p < n or any(c & 0xC0 != 0x80 for c in tail):
+        return b0 if n == 1 else 0
     unit = b0 & (0x1F, 0x0F, 0)[n - 2]  # a 4-byte lead's bits fall out of the 16-bit unit
     for c in tail:
         unit = unit << 6 | c & 0x3F
@@ -65,11 +63,8 @@ def step_char(b, p, end):
 
 
 def is_name_char(b, p, end, first=False):
-    c = b[p]
-    if c < 0x80:
-        return c == 0x5F or chr(c).isalpha() or (not first and chr(c).isdigit())
-    unit = chr(first_code_unit(b, p, end))
-    return unit.isalpha() or (not first and unit.isnumeric())
+    c = chr(b[p]) if b[p] < 0x80 else chr(first_code_unit(b, p, end))
+    return b[p] == 0x5F or c.isalpha() or (not first and (c.isdigit() if b[p] < 0x80 else c.isnumeric()))
 
 
 def find_operator(b, p, end):
@@ -97,19 +92,12 @@ def token_id_for_start(b, p=0, end=None):
     end = len(b) if end is None else end
     if string_start(b, p, end):
         return STRING
-    if p >= end:
-        return ERROR
-    c = b[p]
-    if is_name_char(b, p, end, first=True):
-        return NAME
-    if c in b"\r\n":
-        return NEWLINE
-    if 0x30 <= c <= 0x39 or (c == 0x2E and p + 1 < end and 0x30 <= b[p + 1] <= 0x39):
-        return NUMBER
-    if c == 0x23:
-        return COMMENT
-    op = find_operator(b, p, end)
-    return OPERATORS[op] if op else ERROR
+    op = find_operator(b, p, end) if p < end else None
+    c = b[p] if p < end else None
+    return (ERROR if c is None else NAME if is_name_char(b, p, end, first=True) else
+            NEWLINE if c in b"\r\n" else
+            NUMBER if 0x30 <= c <= 0x39 or c == 0x2E and b[p + 1:p + 2].isdigit() and p + 1 < end
+            else COMMENT if c == 0x23 else OPERATORS[op] if op else ERROR)
 
 
 def escaped(b, k, stop):
