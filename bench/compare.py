@@ -9,13 +9,19 @@ site-packages and dist-packages so that the figures do not move with whatever el
 
 Default mode times, best of several runs in this one process:
   - logicalline, default options and include_line_text=False, parsing alone and parsing plus
-    reading every line's fTokens;
+    reading every line's fTokens, through GetLogicalLineList with a BytesIO's readline;
+  - logicalline, default options, the same two through GetLogicalLineListFromBuffer;
   - tokenize.tokenize consumed to the end;
   - ast.parse (files it rejects are skipped and counted);
   - parso's tokenizer, when parso is installed (pip install .[bench]);
+  - tree-sitter's C parser with its Python grammar, bytes in, when tree-sitter and
+    tree-sitter-python are installed (the 'bench' extra too);
   - a floor: every physical line split on blanks, one bytes object per chunk.
-Then the targets, the cost per MB of a few shapes of source that stress one dimension each,
-and the memory that the lists of lines keep per token.
+Then the cost per MB of a few shapes of source that stress one dimension each, on the readline
+and the buffer paths; the memory that the lists of lines keep per token; editor updates
+(UpdateLogicalLineList after a one-character edit in files of 1,000 to 100,000 lines, and a
+function typed into textwrap.py a key at a time, against full reads); and last the targets,
+each marked with the section its figure comes from.
 
 --ops times the host operations on LogicalLine objects, per call, against a plain Python class
 doing the same bookkeeping, whose tokens are classified by the test suite's model
@@ -23,12 +29,14 @@ doing the same bookkeeping, whose tokens are classified by the test suite's mode
 
 This file is the entry point and holds the default mode and its targets; corpus.py loads the
 corpus, contenders.py holds the timed bodies and the timing helpers, scaling.py the shapes of
-source, memory.py the retained memory, and host_ops.py the --ops table.
+source, memory.py the retained memory, updates.py the editor updates, and host_ops.py the --ops
+table.
 
 Timing rules: time.perf_counter; gc.collect() runs between runs, outside the timed region; the
 cyclic collector stays enabled while a contender runs, as it would in a host. Fast contenders
 get one untimed warm-up run, which also counts their tokens. Warnings are silenced while ast
-parses, because the standard library's tests are full of deliberately odd code.
+parses, because the standard library's tests are full of deliberately odd code. Editor updates
+are timed one call at a time; updates.py says how.
 """
 
 import argparse
@@ -40,32 +48,57 @@ import logicalline
 
 from contenders import (ast_body, floor_body, floor_census, load_text, logicalline_body,
                         logicalline_census, parso, parso_body, parso_inputs, print_timings,
-                        progress, time_contender, tokenize_body)
+                        progress, time_contender, tokenize_body, tree_sitter_body,
+                        tree_sitter_parser)
 from corpus import MB, default_corpus, load_corpus
 from host_ops import run_ops
 from memory import measure_memory, measure_tokenize_memory, print_memory
 from scaling import run_scaling
+from updates import run_updates
 
 
 # ---------------------------------------------------------------------------------------------
 # Targets
 
 
-def print_targets(ll, ll_tokens, tok, ast_result, floor):
-    def check(label, value, minimum, aim=None, at_most=False):
-        met = value <= minimum if at_most else value >= minimum
-        relation = "at most" if at_most else "at least"
-        aim_text = f", aim {aim}x {'met' if value >= aim else 'not met'}" if aim else ""
-        print(f"  {label:<44} {value:>6.1f}x  ({relation} {minimum}x: "
-              f"{'MET' if met else 'NOT MET'}{aim_text})")
+def check(label, value, limit, aim=None, at_most=False, unit="x"):
+    def meets(bound):
+        return value <= bound if at_most else value >= bound
 
-    def speedup(other, own):
-        return other.seconds_per_mb() / own.seconds_per_mb()
+    relation = "at most" if at_most else "at least"
+    aim_text = f", aim {aim}{unit} {'met' if meets(aim) else 'not met'}" if aim else ""
+    shown = f"{value:>6.2f}" if value < 10 else f"{value:>6.1f}"  # 1.26 must not read as 1.3
+    print(f"  {label:<60} {shown}{unit}  ({relation} {limit}{unit}: "
+          f"{'MET' if meets(limit) else 'NOT MET'}{aim_text})")
 
+
+def speedup(other, own):
+    return other.seconds_per_mb() / own.seconds_per_mb()
+
+
+def print_targets(speed, memory_per_token, scaling_worst, update_ratio):
+    """speed maps short names to the Results of the speed table."""
+    tok, ll, ll_tokens, buf = speed["tok"], speed["ll"], speed["ll_tokens"], speed["buf"]
+    print("earlier targets, from the speed table:")
     check("parsing alone vs tokenize, faster by", speedup(tok, ll), 15, aim=30)
-    check("parsing alone vs ast.parse, faster by", speedup(ast_result, ll), 3)
-    check("parsing alone vs the floor, slower by", speedup(ll, floor), 4, at_most=True)
+    check("parsing alone vs ast.parse, faster by", speedup(speed["ast"], ll), 3)
+    check("parsing alone vs the floor, slower by", speedup(ll, speed["floor"]), 4, at_most=True)
     check("parsing + fTokens vs tokenize, faster by", speedup(tok, ll_tokens), 10, aim=20)
+    print("current targets, from the section in brackets:")
+    check("[speed] parsing alone (readline) vs tokenize, faster by", speedup(tok, ll), 30)
+    check("[speed] parse + fTokens (readline) vs tokenize, faster by", speedup(tok, ll_tokens),
+          22, aim=30)
+    check("[memory] default options, after every fTokens read", memory_per_token, 150,
+          aim=120, at_most=True, unit=" B/token")
+    check("[speed] buffer, parsing alone vs tokenize, faster by", speedup(tok, buf), 45, aim=60)
+    check("[speed] buffer vs readline, parsing alone, faster by", speedup(ll, buf), 1.3)
+    for path, name in (("parse", "readline, parse"), ("tokens", "readline, parse + fTokens"),
+                       ("buffer", "buffer, parse")):
+        check(f"[scaling] worst case per MB, {name}", scaling_worst[path], 2, at_most=True)
+    if update_ratio is None:
+        print("  [editor updates] one-character edit, 10,000 lines: not measured")
+    else:
+        check("[editor updates] one-character edit, 10,000 lines, faster by", update_ratio, 50)
 
 
 # ---------------------------------------------------------------------------------------------
@@ -78,12 +111,19 @@ def run_comparison(corpus, runs, slow_runs):
     sources = corpus.sources
     started = time.perf_counter()
 
-    print(f"== Speed (best of {runs} runs, {slow_runs} for tokenize, ast.parse and parso) ==")
+    print(f"== Speed (best of {runs} runs, {slow_runs} for tokenize, ast.parse, parso and "
+          "tree-sitter) ==")
     ll = time_contender("logicalline default, parse", logicalline_body(parser, False), sources,
                         runs, logicalline_census(parser))
     ll_tokens = time_contender("logicalline default, parse + fTokens",
                                logicalline_body(parser, True), sources, runs,
                                logicalline_census(parser))
+    buf = time_contender("logicalline buffer, parse",
+                         logicalline_body(parser, False, from_buffer=True), sources, runs,
+                         logicalline_census(parser, from_buffer=True))
+    buf_tokens = time_contender("logicalline buffer, parse + fTokens",
+                                logicalline_body(parser, True, from_buffer=True), sources, runs,
+                                logicalline_census(parser, from_buffer=True))
     no_text = time_contender("logicalline no line text, parse",
                              logicalline_body(parser_no_text, False), sources, runs,
                              logicalline_census(parser_no_text))
@@ -101,22 +141,30 @@ def run_comparison(corpus, runs, slow_runs):
         parso_result = time_contender(f"parso {parso.__version__} tokenize",
                                       parso_body(version), pairs, slow_runs)
         parso_result.failed += undecodable
+    ts_parser, ts_version = tree_sitter_parser()
+    ts_result = None
+    if ts_parser is not None:
+        ts_result = time_contender(f"tree-sitter {ts_version.split(',')[0]} parse (C)",
+                                   tree_sitter_body(ts_parser), sources, slow_runs)
     print()
-    print_timings([ll, ll_tokens, no_text, no_text_tokens, tok, ast_result, parso_result, floor],
-                  ll)
+    print_timings([ll, ll_tokens, buf, buf_tokens, no_text, no_text_tokens, tok, ast_result,
+                   parso_result, ts_result, floor], ll)
     if parso is None:
         print("  parso tokenize: not installed (pip install parso, or the 'bench' extra)")
+    if ts_parser is None:
+        print(f"  tree-sitter parse: {ts_version}")
     print("(tokens: logicalline counts the tokens of its lines; tokenize and parso count every "
-          "token they yield, NEWLINE, NL, INDENT and DEDENT included; the floor counts chunks)")
-
-    print("\n== Targets ==")
-    print_targets(ll, ll_tokens, tok, ast_result, floor)
+          "token they yield, NEWLINE, NL, INDENT and DEDENT included; the floor counts chunks; "
+          "buffer: GetLogicalLineListFromBuffer on the bytes, the other logicalline rows call "
+          "GetLogicalLineList with a BytesIO's readline; tree-sitter: parser.parse(bytes) per "
+          "file, building its whole syntax tree)")
 
     # Timed before the memory measurements, in the same state of the heap as the corpus, and
     # with the fast contenders' runs: each case takes well under a second.
     print(f"\n== Scaling (logicalline default options, best of {runs}) ==")
-    run_scaling(parser, (ll.seconds_per_mb(), ll.seconds / ll.tokens),
-                (ll_tokens.seconds_per_mb(), ll_tokens.seconds / ll_tokens.tokens), runs)
+    scaling_worst = run_scaling(parser, (ll.seconds_per_mb(), ll.seconds / ll.tokens),
+                                (ll_tokens.seconds_per_mb(), ll_tokens.seconds / ll_tokens.tokens),
+                                (buf.seconds_per_mb(), buf.seconds / buf.tokens), runs)
 
     print("\n== Retained memory, whole corpus held ==")
     measures = [measure_memory(corpus, parser, "logicalline default", True),
@@ -125,6 +173,15 @@ def run_comparison(corpus, runs, slow_runs):
     tokenize_traced, tokenize_tokens = measure_tokenize_memory(corpus)
     progress("measured tokenize memory")
     print_memory(corpus, measures, tokenize_traced, tokenize_tokens)
+    default = measures[0]
+    memory_per_token = (default["traced_tokens"] + default["native"]) / default["tokens"]
+
+    print("\n== Editor updates (logicalline default options) ==")
+    update_ratio = run_updates(parser, corpus, slow_runs)
+
+    print("\n== Targets ==")
+    print_targets({"ll": ll, "ll_tokens": ll_tokens, "buf": buf, "tok": tok, "ast": ast_result,
+                   "floor": floor}, memory_per_token, scaling_worst, update_ratio)
     print(f"\ntotal wall time {time.perf_counter() - started:.0f} s; load average now "
           f"{load_text()}")
 
@@ -155,7 +212,8 @@ def main():
     print(f"corpus: {corpus.root}: {len(corpus.sources):,} files, {corpus.size / MB:.2f} MB, "
           f"{corpus.physical_lines:,} physical lines"
           + (f", {corpus.unreadable} unreadable" if corpus.unreadable else ""))
-    print(f"parso: {parso.__version__ if parso else 'not installed'}; {os.cpu_count()} CPUs, "
+    print(f"parso: {parso.__version__ if parso else 'not installed'}; tree-sitter: "
+          f"{tree_sitter_parser()[1]}; {os.cpu_count()} CPUs, "
           f"load average at start {load_text()} (other work on the machine slows every "
           "contender alike, so the ratios hold better than the seconds)\n")
     if options.ops:

@@ -14,6 +14,7 @@ import sys
 import time
 import tokenize
 import warnings
+from importlib import metadata
 
 from corpus import MB
 
@@ -24,15 +25,29 @@ try:
 except ImportError:
     parso = None
 
+try:
+    import tree_sitter
+    import tree_sitter_python
+except ImportError:
+    tree_sitter = None
 
-def logicalline_body(parser, read_tokens):
+
+def reader(parser, from_buffer):
+    """The call that reads one source: the buffer entry point, or readline over a BytesIO."""
+    if from_buffer:
+        return parser.GetLogicalLineListFromBuffer
     get = parser.GetLogicalLineList
+    return lambda data: get(io.BytesIO(data).readline)  # one call per file, not per line
+
+
+def logicalline_body(parser, read_tokens, from_buffer=False):
+    get = reader(parser, from_buffer)
 
     def parse_only(sources):
         failed = done = 0
         for data in sources:
             try:
-                get(io.BytesIO(data).readline)
+                get(data)
             except ValueError:  # NUL bytes, a line of more tokens than fit
                 failed += 1
             else:
@@ -43,7 +58,7 @@ def logicalline_body(parser, read_tokens):
         failed = done = 0
         for data in sources:
             try:
-                lines = get(io.BytesIO(data).readline)
+                lines = get(data)
             except ValueError:
                 failed += 1
                 continue
@@ -55,12 +70,14 @@ def logicalline_body(parser, read_tokens):
     return parse_and_read_tokens if read_tokens else parse_only
 
 
-def logicalline_census(parser):
+def logicalline_census(parser, from_buffer=False):
+    get = reader(parser, from_buffer)
+
     def count(sources):
         tokens = failed = done = 0
         for data in sources:
             try:
-                lines = parser.GetLogicalLineList(io.BytesIO(data).readline)
+                lines = get(data)
             except ValueError:
                 failed += 1
                 continue
@@ -130,6 +147,34 @@ def parso_body(version):
             else:
                 done += len(data)
         return tokens, failed, done
+
+    return body
+
+
+def tree_sitter_parser():
+    """tree-sitter's parser with its Python grammar, and its version text; (None, why) when it
+    cannot be had."""
+    if tree_sitter is None:
+        return None, ("not installed (pip install tree-sitter tree-sitter-python, or the "
+                      "'bench' extra)")
+    try:
+        language = tree_sitter.Language(tree_sitter_python.language())
+        ts_parser = tree_sitter.Parser(language)
+    except (TypeError, ValueError) as error:  # an older binding with another interface
+        return None, f"unusable here: {type(error).__name__}: {error}"
+    return ts_parser, (f"{metadata.version('tree-sitter')}, grammar "
+                       f"{metadata.version('tree-sitter-python')}")
+
+
+def tree_sitter_body(ts_parser):
+    # Bytes in, as logicalline takes them; the tree is dropped at once, as the lines are by the
+    # parse-only bodies. tree-sitter rejects no file: what it cannot parse becomes error nodes.
+    parse = ts_parser.parse
+
+    def body(sources):
+        for data in sources:
+            parse(data)
+        return None, 0, sum(map(len, sources))
 
     return body
 
