@@ -90,13 +90,15 @@ int HandBack(ReadingState* state, int lineStart, int k) {
     return -1;
   }
   TruncateText(&state->fText, static_cast<size_t>(lineStart));
+  state->fPendingOffset = state->fLineOffset;
   state->fScan.fComplete = 1;  // a string opened by the handed-back line is not ours
   return 0;
 }
 
 // Reads the logical line's physical lines. Returns 0 with *open set, or -1.
-int ReadPhysicalLines(ReadingState* state, int* open) {
+int ReadPhysicalLines(ReadingState* state, int* open, int64_t* offset) {
   if (ReadSourceLine(state) != 0 || TokenizePhysicalLine(state, 0) != 0) return -1;
+  *offset = state->fLineOffset;
   state->fLineNumber++;
   *open = IsLineOpen(state);
   while (!state->fAtEnd && *open) {
@@ -121,7 +123,8 @@ int BuildLogicalLine(ReadingState* state, LineParts* parts) {
   StartLogicalLine(state);
   const int64_t firstLine = state->fLineNumber;
   int open = 0;
-  if (ReadPhysicalLines(state, &open) != 0) return -1;
+  int64_t offset = 0;
+  if (ReadPhysicalLines(state, &open, &offset) != 0) return -1;
   if (state->fScan.fStart != -1 && state->fScan.fComplete == 0) {  // input ended inside a string
     if (AppendUnfinishedString(state) != 0) return -1;
     open = 1;
@@ -145,6 +148,7 @@ int BuildLogicalLine(ReadingState* state, LineParts* parts) {
                      .fTabsInIndent = state->fTabsInIndent,
                      .fIncomplete = open,
                      .fLineText = withText ? state->fText.fData : nullptr,
-                     .fLineTextLength = withText ? state->fText.fLength : 0};
+                     .fLineTextLength = withText ? state->fText.fLength : 0,
+                     .fOffset = offset};
   return 1;
 }

@@ -31,4 +31,5 @@ struct LineParts {
   int fIncomplete;
   const char* fLineText;            // NUL-terminated UTF-8, or null
   size_t fLineTextLength;
+  int64_t fOffset;                  // where the first physical line starts in the source
 };

@@ -27,6 +27,9 @@ struct ReadingState {
   int64_t fLineNumber;   // number of the next physical line to read
   int fAtEnd;            // 1 once readline returned b""
   int fAtStart;          // 1 until the first physical line is read: it may open with a mark
+  int64_t fSourceOffset;   // bytes the source has handed out so far
+  int64_t fPendingOffset;  // where the pending line starts in the source
+  int64_t fLineOffset;     // where the physical line read last starts in the source
   TokenCache* fCache;    // texts shared by the whole call
   // The logical line being built.
   TextBuffer fText;      // every physical line read for it, line breaks included

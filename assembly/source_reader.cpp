@@ -56,6 +56,7 @@ int NextPhysicalLine(ReadingState* state, PyRef* line, const char** bytes, Py_ss
 int ReadSourceLine(ReadingState* state) {
   TextBuffer* pending = &state->fPending;
   if (pending->fLength > 0) {
+    state->fLineOffset = state->fPendingOffset;
     if (AcceptText(state, pending->fData, pending->fLength) != 0) return -1;
     ResetTextBuffer(pending);
     return 0;
@@ -64,6 +65,8 @@ int ReadSourceLine(ReadingState* state) {
   const char* bytes = nullptr;
   Py_ssize_t size = 0;
   if (NextPhysicalLine(state, &line, &bytes, &size) != 0) return -1;
+  state->fLineOffset = state->fSourceOffset;
+  state->fSourceOffset += size;
   if (state->fAtStart) {
     state->fAtStart = 0;
     if (size >= kByteOrderMarkLength && memcmp(bytes, kByteOrderMark, kByteOrderMarkLength) == 0) {

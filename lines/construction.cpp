@@ -85,6 +85,7 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts) {
   line->fIndentLevel = static_cast<int16_t>(parts.fIndentLevel);
   line->fFirstLine = parts.fFirstLine;
   line->fLineCount = static_cast<int16_t>(parts.fLineCount);
+  line->fOffset = parts.fOffset;
   LineType type = kUnknown;
   if (ClassifyLogicalLine(line->fTokenArray, line->fTokenCount, &type, &line->fLocalScopeName) != 0)
     return nullptr;

@@ -23,7 +23,8 @@ PyObject* CopyLogicalLine(LogicalLine* source) {
                            .fTabsInIndent = (source->fFlags & kTabsInIndentFlag) != 0,
                            .fIncomplete = (source->fFlags & kIncompleteFlag) != 0,
                            .fLineText = text,
-                           .fLineTextLength = text ? strlen(text) : 0};
+                           .fLineTextLength = text ? strlen(text) : 0,
+                           .fOffset = source->fOffset};
   PyRef copy = PyRef::Steal(CreateNativeLogicalLine(parts));
   if (!copy) return nullptr;
   LogicalLine* line = AsLine(copy.Get());

@@ -80,6 +80,7 @@ LogicalLine* NewLogicalLine() {
   line->fArgTypeEquivs = empty;
   line->fLineText = nullptr;
   line->fTokensTuple = nullptr;
+  line->fOffset = 0;
   Py_INCREF(Py_None);
   line->fLocalScopeName = Py_None;
   return line;

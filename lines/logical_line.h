@@ -35,6 +35,7 @@ struct LogicalLine {
   char* fLineText;             // own NUL-terminated copy inside fTokenArray's block, or null
   PyObject* fTokensTuple;      // cache of fTokens; the tokens never change once set
   PyObject* fLocalScopeName;   // the defined name on a class or function line, else None
+  int64_t fOffset;             // where its first physical line starts in the text read
 };
 
 // The type. Its methods and attributes are the Python surface's, set before it is readied.

@@ -35,20 +35,10 @@ LogicalLine* LineAt(PyObject* lines, Py_ssize_t i) { return AsLine(PyList_GET_IT
 
 int64_t EndOf(const LogicalLine* line) { return int64_t{line->fFirstLine} + line->fLineCount; }
 
-// The physical lines of the text, cut as BytesIO.readline cuts them.
-int64_t CountPhysicalLines(const char* p, const char* end) {
-  int64_t count = 0;
-  while (p < end) {
-    const auto* feed = static_cast<const char*>(memchr(p, '\n', static_cast<size_t>(end - p)));
-    count++;
-    p = feed ? feed + 1 : end;
-  }
-  return count;
-}
-
-// Returns where physical line `line` starts.
-const char* StartOfLine(const char* p, const char* end, int64_t line) {
-  for (; line > 0 && p < end; line--) {
+// Moves p over `count` physical lines, cut as BytesIO.readline cuts them; stores in *passed
+// how many there were before the end.
+const char* SkipLines(const char* p, const char* end, int64_t count, int64_t* passed) {
+  for (*passed = 0; *passed < count && p < end; ++*passed) {
     const auto* feed = static_cast<const char*>(memchr(p, '\n', static_cast<size_t>(end - p)));
     p = feed ? feed + 1 : end;
   }
@@ -79,9 +69,14 @@ bool ReadsOnAsBefore(PyObject* lines, int64_t number, int64_t old) {
   return next == 0 || EndOf(LineAt(lines, next - 1)) <= old;
 }
 
-// Checks that `lines` is what this module read from a text of oldTotal physical lines: its own
-// line objects, in order, without overlaps. Returns 0, or -1 with an exception set.
-int CheckLines(PyObject* lines, int64_t oldTotal) {
+int RefuseLines() {
+  PyErr_SetString(PyExc_ValueError, "lines do not fit the text before the edit");
+  return -1;
+}
+
+// Checks that `lines` is what this module read: its own line objects, in order, without
+// overlaps. Returns 0, or -1 with an exception set.
+int CheckLines(PyObject* lines) {
   int64_t end = 0;
   for (Py_ssize_t i = 0; i < PyList_GET_SIZE(lines); i++) {
     PyObject* item = PyList_GET_ITEM(lines, i);
@@ -90,13 +85,29 @@ int CheckLines(PyObject* lines, int64_t oldTotal) {
       return -1;
     }
     const LogicalLine* line = AsLine(item);
-    if (line->fFirstLine < end || line->fLineCount < 1 || EndOf(line) > oldTotal) {
-      PyErr_SetString(PyExc_ValueError, "lines do not fit the text before the edit");
-      return -1;
-    }
+    if (line->fFirstLine < end || line->fLineCount < 1 || line->fOffset < 0) return RefuseLines();
     end = EndOf(line);
   }
   return 0;
+}
+
+// Where physical line `number` starts, when the text up to it is as the lines were read: from
+// the nearest line at or before it, whose offset the read recorded, over the lines in between.
+// Returns nullptr with ValueError set when the lines were not read from this text; *whole
+// tells whether the text has that many lines.
+const char* StartOf(PyObject* lines, const char* data, const char* end, int64_t number,
+                    bool* whole) {
+  const Py_ssize_t next = FirstLineFrom(lines, number + 1);
+  const LogicalLine* known = next > 0 ? LineAt(lines, next - 1) : nullptr;
+  if (known && known->fOffset > end - data) {
+    RefuseLines();
+    return nullptr;
+  }
+  const int64_t count = number - (known ? known->fFirstLine : 0);
+  int64_t passed = 0;
+  const char* at = SkipLines(known ? data + known->fOffset : data, end, count, &passed);
+  *whole = passed == count;
+  return at;
 }
 
 // Where the re-read starts: the first line whose reading could have seen the edited lines.
@@ -114,12 +125,16 @@ int64_t ReReadStart(PyObject* lines, const Edit& edit) {
 // at a place where the old read also did, or the text ends. Appends the lines read to `added`
 // and stores the new number of the line where reading stopped. Returns 0, or -1.
 int ReRead(PyObject* parser, PyObject* lines, const Edit& edit, const char* data,
-           const char* dataEnd, int64_t start, PyObject* added, int64_t* stop) {
+           const char* dataEnd, int64_t start, PyObject* added, int64_t* stop,
+           int64_t* stopOffset) {
+  bool whole = true;
+  const char* from = StartOf(lines, data, dataEnd, start, &whole);
+  if (!from) return -1;
   ReadingState state;
-  if (InitReadingState(&state, ParserOptions(parser), nullptr, StartOfLine(data, dataEnd, start),
-                       dataEnd, start) != 0)
+  if (InitReadingState(&state, ParserOptions(parser), nullptr, from, dataEnd, start) != 0)
     return -1;
   state.fAtStart = start == 0;  // a byte-order mark counts only at the start of the text
+  state.fSourceOffset = from - data;
   int status = 0;
   const int64_t editEnd = edit.fFirst + edit.fNewCount;
   while (!state.fAtEnd &&
@@ -138,7 +153,8 @@ int ReRead(PyObject* parser, PyObject* lines, const Edit& edit, const char* data
       break;
     }
   }
-  *stop = state.fLineNumber;
+  *stop = state.fAtEnd ? INT64_MAX : state.fLineNumber;
+  *stopOffset = state.fPending.fLength ? state.fPendingOffset : state.fSourceOffset;
   ReleaseReadingState(&state);
   return status;
 }
@@ -173,25 +189,52 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
   }
   const Edit edit{.fFirst = first, .fOldCount = oldCount, .fNewCount = newCount};
   const char* data = static_cast<const char*>(view.buf);
-  const int64_t newTotal = CountPhysicalLines(data, data + view.len);
-  if (first < 0 || oldCount < 0 || newCount < 0 || edit.fFirst + edit.fNewCount > newTotal) {
+  const char* end = data + view.len;
+  if (first < 0 || oldCount < 0 || newCount < 0) {
     PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
     return nullptr;
   }
-  if (CheckLines(lines, newTotal - edit.Delta()) != 0) return nullptr;
+  if (CheckLines(lines) != 0) return nullptr;
   const int64_t start = ReReadStart(lines, edit);
+  bool whole = true;
+  const char* from = StartOf(lines, data, end, start, &whole);
+  if (!from) return nullptr;
+  int64_t passed = 0;  // the new lines must be in the text: count them, and no further
+  SkipLines(from, end, edit.fFirst + edit.fNewCount - start, &passed);
+  if (!whole || passed < edit.fFirst + edit.fNewCount - start) {
+    PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
+    return nullptr;
+  }
   PyRef added = PyRef::Steal(PyList_New(0));
   int64_t stop = 0;
-  if (!added || ReRead(self, lines, edit, data, data + view.len, start, added.Get(), &stop) != 0)
+  int64_t stopOffset = 0;
+  if (!added ||
+      ReRead(self, lines, edit, data, end, start, added.Get(), &stop, &stopOffset) != 0)
     return nullptr;
-  // Old lines from the start up to where the re-read stopped, in the old numbering, go.
+  // Old lines from the start up to where the re-read stopped, in the old numbering, go. The
+  // ones after it keep their text, moved by the bytes and the lines that the edit changed.
   const Py_ssize_t index = FirstLineFrom(lines, start);
-  const Py_ssize_t kept = FirstLineFrom(lines, stop - edit.Delta());
+  const Py_ssize_t kept = stop == INT64_MAX ? PyList_GET_SIZE(lines)
+                                            : FirstLineFrom(lines, stop - edit.Delta());
+  int64_t byteDelta = 0;
+  if (kept < PyList_GET_SIZE(lines)) {
+    const LogicalLine* next = LineAt(lines, kept);
+    const char* at = SkipLines(data + stopOffset, end, next->fFirstLine + edit.Delta() - stop,
+                               &passed);
+    byteDelta = (at - data) - next->fOffset;
+    const LogicalLine* last = LineAt(lines, PyList_GET_SIZE(lines) - 1);
+    if (last->fOffset + byteDelta >= view.len) {  // the lines run past the new text
+      RefuseLines();
+      return nullptr;
+    }
+  }
   PyRef result = PyRef::Steal(Py_BuildValue("nnO", index, kept - index, added.Get()));
   if (!result || PyList_SetSlice(lines, index, kept, added.Get()) != 0) return nullptr;
   // Nothing can fail from here on: the list is whole again once the later lines have moved.
-  for (Py_ssize_t i = index + PyList_GET_SIZE(added.Get()); i < PyList_GET_SIZE(lines); i++)
+  for (Py_ssize_t i = index + PyList_GET_SIZE(added.Get()); i < PyList_GET_SIZE(lines); i++) {
     LineAt(lines, i)->fFirstLine += static_cast<int32_t>(edit.Delta());
+    LineAt(lines, i)->fOffset += byteDelta;
+  }
   return result.Release();
 }
 

@@ -3,7 +3,6 @@
 OPTIONS = [
     ("--exhaustive", "compare token starts on every 3-byte input (about a minute)"),
     ("--full-stdlib", "check every standard library file against the model and tokenize"),
-    ("--huge", "run the cases that need gigabytes of memory"),
 ]
 
 

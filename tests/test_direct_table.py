@@ -36,30 +36,6 @@ def test_capsules_and_the_empty_record():
     assert DIRECT.GetArgNameCount(line) == 0  # attributes are no argument names
 
 
-@pytest.mark.parametrize("entry, accepted_on, view, refused_on, message", [
-    ("AppendTypeEquivDirect", b"x = 1\n", "fTypeEquivs", None, None),
-    ("AppendArgTypeEquivDirect", b"def f(): pass\n", "fArgTypeEquivs", b"x = 1\n",
-     "Cannot append arg name type equiv to a non-function def line"),
-    ("AppendAttribDirect", b"import os\n", "fImportRefs", b"def f(): pass\n",
-     "Cannot append attrib name type to a class or function def line"),
-    ("AppendArgNameDirect", b"def f(): pass\n", "fArgNames", b"class C: pass\n",
-     "Cannot append arg name to a non-function def line"),
-    ("AppendBaseClassNameDirect", b"class C: pass\n", "fBaseClassNames", b"def f(): pass\n",
-     "Cannot append base class name to a non-class def line"),
-])
-def test_append_entries(entry, accepted_on, view, refused_on, message):
-    args = [object() for _ in range(1 + entry.endswith("EquivDirect"))]
-    before = [sys.getrefcount(a) for a in args]
-    if refused_on:
-        with pytest.raises(ValueError) as info:
-            getattr(DIRECT, entry)(read(refused_on)[0], *args)
-        assert str(info.value) == message and [sys.getrefcount(a) for a in args] == before
-    (line,) = read(accepted_on)
-    assert getattr(DIRECT, entry)(line, *args) == 0
-    assert getattr(line, view) == ((tuple(args) if len(args) == 2 else args[0]),)
-    assert [sys.getrefcount(a) for a in args] == [n + 1 for n in before]
-
-
 def test_function_def_entries():
     (line,), a, b = read(b"def f(a, b): pass\n"), object(), ("x", "y")
     before = sys.getrefcount(a)

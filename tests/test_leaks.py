@@ -13,7 +13,6 @@ import pytest
 
 import logicalline
 from test_direct_table import DIRECT
-from test_model_agreement import run_isolated
 
 ROUNDS = 200
 SOURCE = (b"@deco\nclass C(Base):\n    def f(self, a,\n          b=')'):\n"
@@ -122,26 +121,3 @@ def methods_and_entries():
 @pytest.mark.parametrize("operation", [parsing, methods_and_entries])
 def test_operation_leaks_nothing(operation):
     assert_no_growth(operation)
-
-
-def hooks():
-    """Runs in a fresh interpreter: a create hook stays installed until the process ends."""
-    kinds = itertools.cycle(range(5))
-
-    def hook(*parts):
-        kind = next(kinds)
-        if kind == 1:
-            raise ValueError(parts[0])
-        if kind == 2:
-            logicalline.SetLogicalCreateFunction(hook)  # replaces itself while running
-        if kind == 3 and parts[1] == 0:
-            return read(parts[8].encode(), 1)  # nested
-        return parts if kind else None
-    logicalline.SetLogicalCreateFunction(hook)
-    assert_no_growth(lambda: [attempt(read, source)  # b"\xff": UnicodeDecodeError
-                              for source in (b"x = 1\ny = (\n2)\n", SOURCE, b"x = '\xff'\n")])
-
-
-def test_create_hook_paths_leak_nothing():
-    done = run_isolated("import test_leaks; test_leaks.hooks()")
-    assert done.returncode == 0, done.stderr

@@ -30,17 +30,19 @@ def line_of(source, **options):
     (b"def (a): pass\n", ANY_LINE), (b"from a import b\n", ANY_LINE), (b"# note\n", ANY_LINE),
 ])
 def test_append_by_line_type(source, accepted):
-    for method, message in REFUSALS.items():
-        line, obj = line_of(source), object()
-        args, before = [obj] * (2 if method.endswith("Equiv") else 1), sys.getrefcount(obj)
-        pytest.raises(TypeError, getattr(line, method))  # argument errors come first
-        if method in accepted:
-            assert getattr(line, method)(*args) is None
-            assert sys.getrefcount(obj) == before + len(args)
-        else:
-            with pytest.raises(ValueError, match=f"^{message}$"):
-                getattr(line, method)(*args)
-            assert sys.getrefcount(obj) == before
+    for method, message in REFUSALS.items():  # each method, and its entry in the direct table
+        for direct in (False, True):
+            line, obj = line_of(source), object()
+            args, before = [obj] * (2 if method.endswith("Equiv") else 1), sys.getrefcount(obj)
+            call = getattr(line, method) if not direct else (
+                lambda *args, entry=getattr(DIRECT, method + "Direct"): entry(line, *args) or None)
+            pytest.raises(TypeError, getattr(line, method))  # argument errors come first
+            if method in accepted:
+                assert call(*args) is None and sys.getrefcount(obj) == before + len(args)
+            else:
+                with pytest.raises(ValueError, match=f"^{message}$"):
+                    call(*args)
+                assert sys.getrefcount(obj) == before
 
 
 def test_lists_keep_order_and_identity_and_release_their_objects():
@@ -81,11 +83,10 @@ def test_setters():
     assert line.fParsed is True  # a failing truth test keeps the flag, and no other flag moves
     assert (line.fTabsInIndent, line.fSpacesInIndent, line.fIncomplete) == (True, False, True)
     base = sys.getrefcount(first), sys.getrefcount(second)
-    line.SetScopeName(first)
-    line.SetScopeName(second)
-    assert line.fScopeName is second and sys.getrefcount(first) == base[0]
-    line.SetScopeName(None)
-    assert line.fScopeName is None and sys.getrefcount(second) == base[1]
+    for name in (first, second, None):
+        line.SetScopeName(name)
+        assert line.fScopeName is name
+    assert (sys.getrefcount(first), sys.getrefcount(second)) == base
 
 
 @pytest.mark.parametrize("make_copy", [
@@ -123,32 +124,20 @@ def test_copy_shares_objects_and_owns_storage(make_copy):
     pytest.raises(TypeError, line.Copy, memo={})
 
 
-def test_lines_are_read_only_and_only_the_module_makes_them():
-    line, parser = line_of(b"x = (1,\n     2)\n"), logicalline.CreateLogicalLineParser()
-    assert line.fTokens is line.fTokens and line.fTokens[5] == ("2", (1, 5))
-    for name in [n for n in dir(line) if n[0] == "f"] + ["fNewAttribute"]:
-        pytest.raises(AttributeError, setattr, line, name, 1)
-    for make in (lambda: object.__new__(type(line)), lambda: type(parser)(),
-                 lambda: copy.copy(line), lambda: type("Sub", (type(line),), {})):
-        pytest.raises(TypeError, make)
-
-
-class Scope:  # what a host keeps: an object that refers to its line and is stored on it
-    pass
+Scope = type("Scope", (), {})  # what a host keeps: it refers to its line and is stored on it
 
 
 @pytest.mark.parametrize("source, store", [
     (b"x = 1\n", lambda line, o: line.SetScopeName(o)),
     (b"x = 1\n", lambda line, o: line.AppendAttrib([o])),  # through a list in between
-    (b"def f(): pass\n", lambda line, o: line.AppendArgName(o)),
-    (b"class C: pass\n", lambda line, o: line.AppendBaseClassName(o)),
+    *[(source, lambda line, o, name=name: getattr(line, name)(o)) for source, name in [
+        (b"def f(): pass\n", "AppendArgName"), (b"class C: pass\n", "AppendBaseClassName")]],
     (b"x = 1\n", lambda line, o: line.AppendTypeEquiv("T", o)),
     (b"def f(): pass\n", lambda line, o: line.AppendArgTypeEquiv(o, "T")),
-    (b"x = 1\n", lambda line, o: DIRECT.AppendAttribDirect(line, o)),
-    (b"def f(): pass\n", lambda line, o: DIRECT.AppendArgNameDirect(line, o)),
-    (b"class C: pass\n", lambda line, o: DIRECT.AppendBaseClassNameDirect(line, o)),
-    (b"x = 1\n", lambda line, o: DIRECT.AppendTypeEquivDirect(line, o, o)),
-    (b"def f(): pass\n", lambda line, o: DIRECT.AppendArgTypeEquivDirect(line, "T", o)),
+    *[(source, lambda line, o, name=name, n=n: getattr(DIRECT, name)(line, *[o] * n)) for source, name, n in [
+        (b"x = 1\n", "AppendAttribDirect", 1), (b"def f(): pass\n", "AppendArgNameDirect", 1),
+        (b"class C: pass\n", "AppendBaseClassNameDirect", 1), (b"x = 1\n", "AppendTypeEquivDirect", 2),
+        (b"def f(): pass\n", "AppendArgTypeEquivDirect", 2)]],
 ])
 def test_cycles_through_annotations_are_collected(source, store):
     for copied in (False, True):

@@ -20,25 +20,15 @@ STDLIB = os.path.dirname(os.__file__)
 
 
 def pytest_generate_tests(metafunc):
-    if "stdlib_case" not in metafunc.fixturenames:
-        return
-    files = sorted(os.path.relpath(path, STDLIB) for path in
-                   glob.glob(os.path.join(STDLIB, "**", "*.py"), recursive=True)
-                   if "-packages" not in path)
-    if metafunc.config.getoption("--full-stdlib"):
-        cases = [(f, o) for f in files for o in (DEFAULTS, (False, False, False, True))]
-    else:
-        sample = files[::len(files) // 40]
-        cases = [(f, o) for f in sample[:2] for o in ALL_OPTIONS] + [(f, DEFAULTS) for f in sample[2:]]
-    metafunc.parametrize("stdlib_case", cases, ids=[
-        f + "-" + "".join(str(int(x)) for x in o) for f, o in cases])
-
-
-def text_view(text):
-    try:
-        return text if text is None else text.decode()
-    except UnicodeDecodeError:
-        return "<undecodable>"
+    if "stdlib_case" in metafunc.fixturenames:
+        files = sorted(os.path.relpath(path, STDLIB) for path in glob.glob(
+            os.path.join(STDLIB, "**", "*.py"), recursive=True) if "-packages" not in path)
+        if metafunc.config.getoption("--full-stdlib"):
+            cases = [(f, o) for f in files for o in (DEFAULTS, (False, False, False, True))]
+        else:
+            sample = files[::len(files) // 40]
+            cases = [(f, o) for f in sample[:2] for o in ALL_OPTIONS] + [(f, DEFAULTS) for f in sample]
+        metafunc.parametrize("stdlib_case", cases)
 
 
 def outcome(read):
@@ -50,8 +40,11 @@ def outcome(read):
 
 
 def model_view(line):
-    return dict(line, tokens=[t.decode("utf-8", "replace") for t in line["tokens"]],
-                line_text=text_view(line["line_text"]))
+    try:
+        text = line["line_text"] and line["line_text"].decode()
+    except UnicodeDecodeError:
+        text = "<undecodable>"
+    return dict(line, tokens=[t.decode("utf-8", "replace") for t in line["tokens"]], line_text=text)
 
 
 def module_view(line):

@@ -6,28 +6,18 @@ import pytest
 import logicalline
 from model import LINE_TYPES, OPTIONS
 
-ATTRIB_KINDS = {"kClassAttribKind": "class def", "kFunctionAttribKind": "function def",
-                "kGenericAttribKind": "generic attribute",
-                "kImportedAttribKind": "imported attribute"}
-FUNCTIONS = {"CreateLogicalLineParser", "GetDirectLogicalLineFunctionTable",
-             "GetIdForTokenStart", "_GetFirstCodeUnit", "SetLogicalCreateFunction"}
+KINDS = {"kClassAttribKind": "class def", "kFunctionAttribKind": "function def",
+         "kGenericAttribKind": "generic attribute", "kImportedAttribKind": "imported attribute"}
 
 
-def test_constants_and_names():
+def test_constants():  # the names themselves are checked against the stub by stubtest
     constants = [getattr(logicalline, name) for name in LINE_TYPES]
-    assert [type(c) for c in constants] == [bytes] * 26 and constants == list(LINE_TYPES.values())
-    assert len({id(c) for c in constants}) == 26
-    assert {name: getattr(logicalline, name) for name in ATTRIB_KINDS} == ATTRIB_KINDS
-    infos = {name[:-4] + "Info" for name in ATTRIB_KINDS} - {"kImportedAttribInfo"}
-    for name in infos:
-        info, kind = getattr(logicalline, name), getattr(logicalline, name[:-4] + "Kind")
-        assert type(info) is tuple and info == (kind, None) and info[0] is kind
-    assert type(logicalline.COMMENT_TOKEN) is int and logicalline.COMMENT_TOKEN == 202
-    public = {name for name in dir(logicalline) if not name.startswith("__")}
-    assert public == (FUNCTIONS | set(LINE_TYPES) | set(ATTRIB_KINDS) | infos
-                      | {"LogicalLineType", "COMMENT_TOKEN"})
-    assert {name for name in public if callable(getattr(logicalline, name))} == (
-        FUNCTIONS | {"LogicalLineType"})
+    assert constants == list(LINE_TYPES.values()) and len(set(map(id, constants))) == 26
+    assert {name: getattr(logicalline, name) for name in KINDS} == KINDS
+    for name in KINDS.keys() - {"kImportedAttribKind"}:
+        info = getattr(logicalline, name[:-4] + "Info")
+        assert info == (getattr(logicalline, name), None) and info[0] is getattr(logicalline, name)
+    assert logicalline.COMMENT_TOKEN == 202 and not hasattr(logicalline, "kImportedAttribInfo")
 
 
 class Raising:
@@ -41,13 +31,11 @@ class Raising:
 @pytest.mark.parametrize("number, flags", list(enumerate(itertools.product((0, 1), repeat=4))))
 def test_options(number, flags):
     copy_strings, skip_whitespace_lines, remove_comments, include_line_text = flags
-    comment = [] if remove_comments else ["# tail\n"]  # a comment keeps its line feed
-    want = [(["s", "=", "'a'" if copy_strings else "'<string>'"] + comment,
+    want = [(["s", "=", "'a'" if copy_strings else "'<string>'"] + ["# tail\n"] * (1 - remove_comments),
              "s = 'a'  # tail\n" if include_line_text else None)]
     if not skip_whitespace_lines and not remove_comments:
         want.insert(0, (["# lead\n"], "# lead\n" if include_line_text else None))
-    # The first few go by position, the others by keyword, or are left to default to on; any
-    # object is taken by its truth.
+    # The first few by position, the others by keyword or left on; any object is a truth value.
     k = number % 5
     keywords = {name: [[], None, ""][number % 3] for name, flag in zip(OPTIONS[k:], flags[k:])
                 if not flag}
@@ -55,8 +43,7 @@ def test_options(number, flags):
     lines = parser.GetLogicalLineList(io.BytesIO(b"# lead\ns = 'a'  # tail\n").readline)
     assert [([text for text, _ in line.fTokens], line.fLineText) for line in lines] == want
     order = ("skip_whitespace_lines", "remove_comments", "copy_strings", "include_line_text")
-    first = number % 4  # truth tests run in this order; every option from `first` on raises
-    with pytest.raises(LookupError) as info:
-        logicalline.CreateLogicalLineParser(**{name: Raising(name) for name in order[first:]})
-    assert info.value.args == (order[first],)
+    with pytest.raises(LookupError) as info:  # the truth tests run in this order
+        logicalline.CreateLogicalLineParser(**{name: Raising(name) for name in order[number % 4:]})
+    assert info.value.args == (order[number % 4],)
     pytest.raises(TypeError, logicalline.CreateLogicalLineParser, 1, 1, 1, 1, 1)
