@@ -1,4 +1,4 @@
-# Opt-in runs that take minutes or gigabytes; the normal suite stays fast.
+# Opt-in runs that take minutes; the normal suite stays fast.
 
 OPTIONS = [
     ("--exhaustive", "compare token starts on every 3-byte input (about a minute)"),

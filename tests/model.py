@@ -180,12 +180,11 @@ class Builder:
 
     def __init__(self, copy_strings, remove_comments):
         self.copy_strings, self.remove_comments = copy_strings, remove_comments
-        self.text, self.line_starts = b"", []
+        self.text, self.line_starts, self.tokens, self.positions = b"", [], [], []
         # Scanner state; complete is 0 while a string runs on to the next physical line.
         self.scan = SimpleNamespace(tok=0, start=-1, end=-1, complete=0, quote=0, triple=0)
-        self.tokens, self.positions = [], []
-        self.line_index = self.nesting = 0
-        self.indent, self.tabs, self.spaces = -1, 0, 0
+        self.line_index = self.nesting = self.tabs = self.spaces = 0
+        self.indent = -1
 
     def position(self, start):
         # Placed on the physical line, as read, that holds the token's first byte.
@@ -207,18 +206,14 @@ class Builder:
                         self.indent, self.spaces = self.indent + 1, 1
             if not st.complete or st.tok == NEWLINE or (st.tok == COMMENT and self.remove_comments):
                 continue
-            text = b[st.start:st.end]
-            if st.tok == STRING and not self.copy_strings:
-                text = STRING_PLACEHOLDER
-            elif st.tok == ERROR:
-                text = ERROR_PREFIX + text
-            elif st.tok not in (NAME, NUMBER, STRING, COMMENT):
-                text = CANONICAL[st.tok]
+            text = (STRING_PLACEHOLDER if st.tok == STRING and not self.copy_strings else
+                    ERROR_PREFIX + b[st.start:st.end] if st.tok == ERROR else
+                    b[st.start:st.end] if st.tok in (NAME, NUMBER, STRING, COMMENT) else
+                    CANONICAL[st.tok])
             self.append(text, self.position(st.start))
 
     def append(self, text, position):
-        self.tokens.append(text)
-        self.positions.append(position)
+        self.tokens.append(text), self.positions.append(position)
         self.nesting += nesting_delta(text)
 
     def hand_back(self, k):

@@ -21,10 +21,10 @@ def test_capsules_and_the_empty_record():
     objects = (line, read(b"x = 1\n")[0], "x", None, logicalline.CreateLogicalLineParser(),
                logicalline.LogicalLineType)
     assert [DIRECT.IsLogical(obj) for obj in objects] == [1, 1, 0, 0, 0, 0]
-    assert line.fType is logicalline.kUnknown and line.fTokens == () and line.fLineText is None
-    assert (line.fFirstLine, line.fLineCount, line.fIndentLevel, line.fTokenCount) == (0, 0, 0, 0)
-    assert not (line.fParsed or line.fTabsInIndent or line.fSpacesInIndent or line.fIncomplete)
-    assert line.fScopeName is None and line.fLocalScopeName is None
+    assert (line.fType, line.fTokens, line.fLineText, line.fScopeName, line.fLocalScopeName,
+            line.fFirstLine, line.fLineCount, line.fIndentLevel, line.fTokenCount, line.fParsed,
+            line.fTabsInIndent, line.fSpacesInIndent, line.fIncomplete) == (
+        logicalline.kUnknown, (), None, None, None, 0, 0, 0, 0, False, False, False, False)
     pytest.raises(SystemError, line.Copy)  # a line count of 0 cannot be constructed
     pytest.raises(IndexError, line.GetTokenType, 0)
     assert DIRECT.GetArgNameCount(line) == 0

@@ -1,4 +1,3 @@
-import io
 import json
 import pathlib
 import socket
@@ -74,28 +73,14 @@ def test_text_is_decoded_as_the_interpreter_would(tmp_path, capsys, data):
     assert json.loads(out)["tokens"][2] == ["'café'", data.count(b"\n"), 4]
 
 
-def test_json_numbers_lines_from_1_and_agrees_with_the_module(capsys, monkeypatch):
-    monkeypatch.setattr(sys, "stdin", io.TextIOWrapper(io.BytesIO(SOURCE)))
-    status, out, _ = run(capsys, "--json", "-")
-    lines = logicalline.CreateLogicalLineParser().GetLogicalLineList(io.BytesIO(SOURCE).readline)
-    physical = SOURCE.decode("utf-8", "replace").splitlines(keepends=True)
-    assert status == 0 and [[r[key] for key in r] for r in map(json.loads, out.splitlines())] == [
-        ["-", next(k for k in dir(logicalline) if getattr(logicalline, k) is x.fType),
-         x.fType.decode(), x.fFirstLine + 1, x.fLineCount, x.fIndentLevel, x.fTabsInIndent,
-         x.fSpacesInIndent, x.fIncomplete, x.fLocalScopeName,
-         "".join(physical[x.fFirstLine:x.fFirstLine + x.fLineCount]),
-         [[text, x.fFirstLine + 1 + row, column] for text, (row, column) in x.fTokens]]
-        for x in lines]
-
-
 @pytest.mark.parametrize("window", [1, 2, 3, 5, 100])
-@pytest.mark.parametrize("options", [{}, {"skip_whitespace_lines": False}])
-def test_windows_give_what_one_read_gives(window, options):
-    parser = logicalline.CreateLogicalLineParser(**options)
-    whole = parser.GetLogicalLineList(io.BytesIO(SPANNING).readline, 1)
-    read = [line for lines, _ in reading.windows(parser, SPANNING, window) for line in lines]
-    assert [(x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in read] == [
-        (x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in whole]
+def test_windows_give_what_one_read_gives(window):
+    for skip in (True, False):
+        parser = logicalline.CreateLogicalLineParser(skip_whitespace_lines=skip)
+        whole = parser.GetLogicalLineListFromBuffer(SPANNING, 1)
+        read = [line for lines, _ in reading.windows(parser, SPANNING, window) for line in lines]
+        assert [(x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in read] == [
+            (x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in whole]
 
 
 @pytest.mark.parametrize("style", [["--json"], []])
@@ -113,17 +98,6 @@ def test_progress_only_on_a_terminal(tree, capsys, monkeypatch, terminal, shown)
     monkeypatch.setattr(sys.stderr, "isatty", lambda: terminal)
     _, _, err = run(capsys, "ok.py", "bad.py")
     assert ("/2 files" in err) == shown and run(capsys, "-q", "ok.py", "bad.py")[2] == ""
-
-
-@pytest.mark.parametrize("jobs", [[], ["--jobs", "2"]])
-def test_closed_pipe_ends_quietly(tmp_path, jobs):
-    for number in range(4):
-        (tmp_path / f"{number}.py").write_bytes(CLOSED * 2000)
-    child = subprocess.Popen([sys.executable, "-m", "logicalline_dump", *jobs, str(tmp_path)],
-                             stdout=subprocess.PIPE, stderr=subprocess.PIPE)
-    child.stdout.read(100)
-    child.stdout.close()
-    assert child.wait(timeout=60) == 141 and child.stderr.read() == b""
 
 
 def test_memory_does_not_grow_with_the_file(tmp_path):

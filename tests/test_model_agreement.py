@@ -63,8 +63,7 @@ def module_view(line):
 
 
 def assert_agreement(chunks, opts, first_line=0, line_count=-1):
-    """The module reads the chunks as the model does, through readline; and reads the joined
-    text from a buffer as the model does with the text cut where BytesIO.readline cuts it."""
+    """Both entry points read as the model does; a buffer is cut where BytesIO.readline cuts."""
     data, parser = b"".join(chunks), logicalline.CreateLogicalLineParser(*opts)
     lines = io.BytesIO(data).readlines()
     for path, source, read in [
@@ -86,8 +85,7 @@ def assert_agreement(chunks, opts, first_line=0, line_count=-1):
 
 
 def read(source, *window, **options):
-    """The logical lines of `source` (bytes, cut as readline cuts, or a list of the chunks that
-    readline hands out), once the model has been shown to read them alike."""
+    """The lines of `source` (bytes, or the chunks readline gives), once the model agrees."""
     chunks = io.BytesIO(source).readlines() if isinstance(source, bytes) else list(source)
     opts = [options.get(name, True) for name in model.OPTIONS]
     assert_agreement(chunks, opts, *window)
@@ -146,8 +144,7 @@ def test_hostile_inputs(block):
 
 
 def run_isolated(code):
-    """Runs code in a fresh interpreter (a create hook stays for the life of the process) with
-    this directory and the module importable; returns the finished process."""
+    """Runs code in a fresh interpreter, where a create hook can stay for good."""
     path = [os.path.dirname(logicalline.__file__), os.path.dirname(os.path.abspath(__file__)),
             os.environ.get("PYTHONPATH", "")]
     return subprocess.run([sys.executable, "-c", code], capture_output=True, text=True,
