@@ -51,11 +51,8 @@ def first_code_unit(b, p=0, end=None):
     return unit & 0xFFFF
 
 
-def step_char(b, p, end):
-    # A malformed sequence stops before the first byte that is no continuation byte.
-    b0 = b[p]
-    stop = min(end, p + (1 if b0 < 0x80 else 2 if b0 < 0xE0 else 3 if b0 < 0xF0 else
-                         4 if b0 < 0xF8 else 3))
+def step_char(b, p, end):  # a malformed sequence stops before a byte that continues nothing
+    stop = min(end, p + (1, 2, 3, 4, 3)[sum(b[p] >= bound for bound in (0x80, 0xE0, 0xF0, 0xF8))])
     p += 1
     while p < stop and b[p] & 0xC0 == 0x80:
         p += 1
@@ -67,10 +64,8 @@ def is_name_char(b, p, end, first=False):
     return b[p] == 0x5F or c.isalpha() or (not first and (c.isdigit() if b[p] < 0x80 else c.isnumeric()))
 
 
-def find_operator(b, p, end):
-    """The longest operator text at p that lies wholly before end, or None."""
-    return next((b[p:p + n] for n in (3, 2, 1) if p + n <= end and b[p:p + n] in OPERATORS),
-                None)
+def find_operator(b, p, end):  # the longest operator at p that lies wholly before end
+    return next((b[p:p + n] for n in (3, 2, 1) if p + n <= end and b[p:p + n] in OPERATORS), None)
 
 
 def string_start(b, p, end):
@@ -100,8 +95,7 @@ def token_id_for_start(b, p=0, end=None):
             else COMMENT if c == 0x23 else OPERATORS[op] if op else ERROR)
 
 
-def escaped(b, k, stop):
-    """True when an odd run of backslashes ends just before k, not looking back past stop."""
+def escaped(b, k, stop):  # an odd run of backslashes ends just before k, from stop on
     return (k - stop - len(b[stop:k].rstrip(b"\\"))) % 2 == 1
 
 
@@ -331,16 +325,12 @@ def classify(tokens):
         return BLANK_LINE, None
     line_type = LINE_KEYWORDS.get(tokens[key])
     if line_type in (CLASS_DEF, FUNCTION_DEF):
-        for t in tokens[key + 1:]:
-            if token_id_for_start(t) == NAME and t != b"async":
-                return line_type, t.decode("utf-8", "replace")
-            if t[:1] in (b"(", b")", b":"):
-                break
-        return UNKNOWN, None
-    if line_type is not None:
-        return line_type, None
-    if len(tokens) == 1 and tokens[0][:1] == b"#":
-        return COMMENT_LINE, None
+        name = next((t for t in tokens[key + 1:] if t[:1] in (b"(", b")", b":") or
+                     token_id_for_start(t) == NAME and t != b"async"), b"(")
+        return (UNKNOWN, None) if name[:1] in (b"(", b")", b":") else (line_type, name.decode(
+            "utf-8", "replace"))
+    if line_type is not None or len(tokens) == 1 and tokens[0][:1] == b"#":
+        return (COMMENT_LINE if line_type is None else line_type), None
     depth, all_strings = 0, True
     for t in tokens:
         if t == b"=" and depth == 0:

@@ -47,17 +47,14 @@ def test_function_def_entries():
         assert DIRECT.GetArgName(line, 0) is a and DIRECT.GetArgName(line, 1) is b
     assert DIRECT.GetArgNameCount(line) == 2 and DIRECT.GetNamesDefined(line) == ("f",)
     for bad in (2, -1):
-        with pytest.raises(IndexError, match="^Invalid arg name index$"):
-            DIRECT.GetArgName(line, bad)
+        pytest.raises(IndexError, DIRECT.GetArgName, line, bad).match("^Invalid arg name index$")
     line.SetScopeName("outer")
     assert DIRECT.ClearAppended(line) == DIRECT.ClearAppended(line) == 0
     assert sys.getrefcount(a) == before and line.fLocalScopeName == "f"
     assert (line.fArgNames, line.fTypeEquivs, line.fArgTypeEquivs, line.fScopeName) == (
         (), (), (), "outer")
     objs = [object() for _ in range(5)]  # storage starts afresh
-    for o in objs:
-        DIRECT.AppendArgNameDirect(line, o)
-    assert line.fArgNames == tuple(objs) and DIRECT.GetArgNameCount(read(b"import f\n")[0]) == 0
+    assert [DIRECT.AppendArgNameDirect(line, o) for o in objs] == [0] * 5 and line.fArgNames == tuple(objs)
 
 
 def test_token_type_entries():

@@ -10,7 +10,6 @@ import logicalline
 from logicalline_dump import dump, progress, reading
 from logicalline_dump.__main__ import PARSER_OPTIONS, main
 
-# Tab indent, a line cut short by the next statement, a scope name, a byte that is not UTF-8.
 SOURCE = b"class C:\n\tdef f(self, a,\n\t\treturn '\xff'  # note\n"
 # Lines that run over brackets, backslashes, strings and blank lines, and a last one left open.
 SPANNING = (b"x = (1,\n\n 2)\n# c\ns = '''a\n\nb'''\ny = 1 + \\\n  2\r\n\n\n"

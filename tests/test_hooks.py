@@ -9,9 +9,9 @@ PARSER = logicalline.CreateLogicalLineParser()
 def read(source, *args, **options):
     parser = logicalline.CreateLogicalLineParser(**options)
     return parser.GetLogicalLineList(io.BytesIO(source).readline, *args)
-def outcome(source, *args, **options):
+def outcome(source):
     try:
-        return read(source, *args, **options)
+        return read(source)
     except Exception as e:
         return type(e).__name__
 '''

@@ -10,8 +10,7 @@ import logicalline
 from test_model_agreement import STDLIB
 
 PARSER = logicalline.CreateLogicalLineParser()
-# Lines that open and close strings and brackets, continue with backslashes, start statements
-# inside brackets, and a byte-order mark that counts only at the very start.
+# Lines that open and close strings and brackets, join, hand back, and a byte-order mark.
 PIECES = [b"x = 1\n", b"def f(a,\n", b"  b):\n", b"    return a\n", b"'''\n", b"s = '''doc\n",
           b")\n", b"]\n", b"\n", b"   \n", b"# c\n", b"y = (1 \\\n", b"if x:\n", b"else: y\n",
           b"@d\n", b"class C:\n", b"z = [i for i in y\n", b"    if i]\n", b"\xef\xbb\xbfq\n",
