@@ -7,7 +7,7 @@ from REV, so two versions of the suite can be compared on the same code.
 
     python tools/mutants.py --list
     python tools/mutants.py [--only a,b] [--sanitize] [--tests-from REV] [--out table.md]
-    python tools/mutants.py --suite-args=--leaks   # with the opt-in leak checks
+    python tools/mutants.py --suite-args=--full-stdlib   # with the slow checks too
 """
 
 import argparse
