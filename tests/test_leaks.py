@@ -13,6 +13,7 @@ import pytest
 
 import logicalline
 from test_direct_table import DIRECT
+from test_model_agreement import run_isolated
 
 ROUNDS = 200
 SOURCE = (b"@deco\nclass C(Base):\n    def f(self, a,\n          b=')'):\n"
@@ -38,8 +39,8 @@ def usage():
 
 
 def assert_no_growth(operation):
-    """Runs `operation` ROUNDS times, then ROUNDS more that must grow nothing. A one-off growth
-    (an interpreter cache filling up) gets two more tries; a leak grows on every one."""
+    """Runs `operation` ROUNDS times, then ROUNDS more that must grow nothing; a one-off growth
+    (a cache filling up) gets two more tries."""
     for _ in range(ROUNDS):
         operation()
     for _ in range(3):
@@ -54,8 +55,8 @@ def assert_no_growth(operation):
 
 
 def read(source=SOURCE, first_line=0, line_count=-1, *options):
-    parser = logicalline.CreateLogicalLineParser(*options)
-    return parser.GetLogicalLineList(io.BytesIO(source).readline, first_line, line_count)
+    return logicalline.CreateLogicalLineParser(*options).GetLogicalLineList(
+        io.BytesIO(source).readline, first_line, line_count)
 
 
 def attempt(call, *args, **kwargs):
@@ -118,6 +119,7 @@ def methods_and_entries():
     DIRECT.GetLogicalTypeObject()
 
 
-@pytest.mark.parametrize("operation", [parsing, methods_and_entries])
-def test_operation_leaks_nothing(operation):
-    assert_no_growth(operation)
+@pytest.mark.parametrize("operation", ["parsing", "methods_and_entries"])
+def test_operation_leaks_nothing(operation):  # in a fresh interpreter, clear of other tests' state
+    done = run_isolated(f"import test_leaks as t; t.assert_no_growth(t.{operation})")
+    assert done.returncode == 0, done.stderr

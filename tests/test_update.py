@@ -37,8 +37,7 @@ def edit(doc, lines, first, old_count, new, open_end=False):
         (i for i, (a, b) in enumerate(zip(doc[::-1], text[::-1])) if a != b), len(text)))
     end = max(first + old_count, len(doc) - tail)
     old_count, new = end - first, text[first:end + len(text) - len(doc)]
-    before = list(lines)
-    for line in before:
+    for line in (before := list(lines)):
         line.SetScopeName(line)  # an annotation that must stay with the object
     index, removed, added = PARSER.UpdateLogicalLineList(lines, b"".join(text), first,
                                                          old_count, len(new))
@@ -82,8 +81,7 @@ def test_edits_of_real_files(name):
     (("x = 1\ny = 2\n", 0, 0, 0), TypeError),
 ])
 def test_refusals_leave_the_list_alone(args, error):
-    lines = PARSER.GetLogicalLineListFromBuffer(b"x = 1\ny = 2\n")
-    before = list(lines)
+    before = list(lines := PARSER.GetLogicalLineListFromBuffer(b"x = 1\ny = 2\n"))
     pytest.raises(error, PARSER.UpdateLogicalLineList, lines, *args)
     assert lines == before and [line.fFirstLine for line in lines] == [0, 1]
     for bad in (tuple(lines), lines + ["x"]):
