@@ -110,7 +110,8 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
     if (!position) return nullptr;
     PyRef text = PyRef::Steal(TextOf(line->fTokenArray[i]));
     if (!text) return nullptr;
-    const bool shared = IsSharedText(line->fTokenArray[i]) && IsSharedPosition(line->fTokenPositions[i]);
+    const bool shared =
+        IsSharedText(line->fTokenArray[i]) && IsSharedPosition(line->fTokenPositions[i]);
     PyObject* entry = EntryOf(text.Get(), position.Get(), shared);
     if (!entry) return nullptr;
     PyTuple_SET_ITEM(tuple.Get(), i, entry);

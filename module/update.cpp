@@ -159,6 +159,43 @@ int ReRead(PyObject* parser, PyObject* lines, const Edit& edit, const char* data
   return status;
 }
 
+PyObject* RefuseChangedLines() {
+  PyErr_SetString(PyExc_RuntimeError, "lines changed during the update");
+  return nullptr;
+}
+
+// The list's items, held in a list of our own for the whole update: reading allocates, a
+// collection that sets off may run a host's finalizer, and that may change the list. Returns a
+// new list, or nullptr with an exception set.
+PyObject* HoldLines(PyObject* lines) {
+  const Py_ssize_t count = PyList_GET_SIZE(lines);
+  PyRef held = PyRef::Steal(PyList_New(count));
+  if (!held) return nullptr;
+  if (PyList_GET_SIZE(lines) != count) return RefuseChangedLines();
+  for (Py_ssize_t i = 0; i < count; i++) {
+    PyObject* item = PyList_GET_ITEM(lines, i);
+    Py_INCREF(item);
+    PyList_SET_ITEM(held.Get(), i, item);
+  }
+  return held.Release();
+}
+
+// True when `lines` still holds exactly the items of `held`.
+bool SameItems(PyObject* lines, PyObject* held) {
+  const Py_ssize_t count = PyList_GET_SIZE(held);
+  return PyList_GET_SIZE(lines) == count &&
+         (count == 0 || memcmp(PySequence_Fast_ITEMS(lines), PySequence_Fast_ITEMS(held),
+                               static_cast<size_t>(count) * sizeof(PyObject*)) == 0);
+}
+
+// Moves the lines from index `from` on by `lineDelta` physical lines and `byteDelta` bytes.
+void MoveLines(PyObject* held, Py_ssize_t from, int64_t lineDelta, int64_t byteDelta) {
+  for (Py_ssize_t i = from; i < PyList_GET_SIZE(held); i++) {
+    LineAt(held, i)->fFirstLine += static_cast<int32_t>(lineDelta);
+    LineAt(held, i)->fOffset += byteDelta;
+  }
+}
+
 PyDoc_STRVAR(kUpdateLogicalLineListDoc,
              "Update a list of logical lines after an edit of the text it was read from.  "
              "Arguments: the list (read by this parser from line 0, maybe updated before), the "
@@ -194,10 +231,11 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
     PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
     return nullptr;
   }
-  if (CheckLines(lines) != 0) return nullptr;
-  const int64_t start = ReReadStart(lines, edit);
+  PyRef held = PyRef::Steal(HoldLines(lines));
+  if (!held || CheckLines(held.Get()) != 0) return nullptr;
+  const int64_t start = ReReadStart(held.Get(), edit);
   bool whole = true;
-  const char* from = StartOf(lines, data, end, start, &whole);
+  const char* from = StartOf(held.Get(), data, end, start, &whole);
   if (!from) return nullptr;
   int64_t passed = 0;  // the new lines must be in the text: count them, and no further
   SkipLines(from, end, edit.fFirst + edit.fNewCount - start, &passed);
@@ -209,31 +247,34 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
   int64_t stop = 0;
   int64_t stopOffset = 0;
   if (!added ||
-      ReRead(self, lines, edit, data, end, start, added.Get(), &stop, &stopOffset) != 0)
+      ReRead(self, held.Get(), edit, data, end, start, added.Get(), &stop, &stopOffset) != 0)
     return nullptr;
   // Old lines from the start up to where the re-read stopped, in the old numbering, go. The
   // ones after it keep their text, moved by the bytes and the lines that the edit changed.
-  const Py_ssize_t index = FirstLineFrom(lines, start);
-  const Py_ssize_t kept = stop == INT64_MAX ? PyList_GET_SIZE(lines)
-                                            : FirstLineFrom(lines, stop - edit.Delta());
+  const Py_ssize_t index = FirstLineFrom(held.Get(), start);
+  const Py_ssize_t kept = stop == INT64_MAX ? PyList_GET_SIZE(held.Get())
+                                            : FirstLineFrom(held.Get(), stop - edit.Delta());
   int64_t byteDelta = 0;
-  if (kept < PyList_GET_SIZE(lines)) {
-    const LogicalLine* next = LineAt(lines, kept);
+  if (kept < PyList_GET_SIZE(held.Get())) {
+    const LogicalLine* next = LineAt(held.Get(), kept);
     const char* at = SkipLines(data + stopOffset, end, next->fFirstLine + edit.Delta() - stop,
                                &passed);
     byteDelta = (at - data) - next->fOffset;
-    const LogicalLine* last = LineAt(lines, PyList_GET_SIZE(lines) - 1);
+    const LogicalLine* last = LineAt(held.Get(), PyList_GET_SIZE(held.Get()) - 1);
     if (last->fOffset + byteDelta >= view.len) {  // the lines run past the new text
       RefuseLines();
       return nullptr;
     }
   }
   PyRef result = PyRef::Steal(Py_BuildValue("nnO", index, kept - index, added.Get()));
-  if (!result || PyList_SetSlice(lines, index, kept, added.Get()) != 0) return nullptr;
-  // Nothing can fail from here on: the list is whole again once the later lines have moved.
-  for (Py_ssize_t i = index + PyList_GET_SIZE(added.Get()); i < PyList_GET_SIZE(lines); i++) {
-    LineAt(lines, i)->fFirstLine += static_cast<int32_t>(edit.Delta());
-    LineAt(lines, i)->fOffset += byteDelta;
+  if (!result) return nullptr;
+  if (!SameItems(lines, held.Get())) return RefuseChangedLines();
+  // The later lines move first, and move back if the list cannot take the new ones; nothing
+  // between here and the end runs code of the host's.
+  MoveLines(held.Get(), kept, edit.Delta(), byteDelta);
+  if (PyList_SetSlice(lines, index, kept, added.Get()) != 0) {
+    MoveLines(held.Get(), kept, -edit.Delta(), -byteDelta);
+    return nullptr;
   }
   return result.Release();
 }

@@ -1,5 +1,6 @@
 """UpdateLogicalLineList: after any sequence of edits the list is what a full read of the text
 gives, and every line outside the replaced slice is the same object, annotations and all."""
+import gc
 import os
 import random
 
@@ -86,3 +87,29 @@ def test_refusals_leave_the_list_alone(args, error):
     assert lines == before and [line.fFirstLine for line in lines] == [0, 1]
     for bad in (tuple(lines), lines + ["x"]):
         pytest.raises(TypeError, PARSER.UpdateLogicalLineList, bad, b"x = 1\ny = 2\n", 0, 0, 0)
+
+
+def test_a_collection_midway_that_changes_the_list():
+    """Reading allocates, and a collection it sets off may run a finalizer that rewrites the
+    list; the update must then neither read nor write through what the list now holds."""
+    text = b"".join(b"x%d = (1,\n  2)\n" % i for i in range(30))
+    for threshold in range(1, 40):
+        lines = PARSER.GetLogicalLineListFromBuffer(text)
+        gc.collect()
+        meddler = type("Meddler", (), {"__del__": lambda self: lines.__setitem__(
+            slice(None), [b"not a line " * 9] * len(lines))})()
+        meddler.cycle = meddler
+        del meddler
+        gc.set_threshold(threshold)
+        try:
+            done = PARSER.UpdateLogicalLineList(lines, text, 20, 1, 1)
+        except (TypeError, RuntimeError):  # changed before the read, or during it: refused
+            done = None
+        finally:
+            gc.disable()  # the meddler, if still there, waits until the checks are done
+            gc.set_threshold(700)
+        try:
+            assert (lines[0] == b"not a line " * 9 if done is None else
+                    view(lines) == view(PARSER.GetLogicalLineListFromBuffer(text)))
+        finally:
+            gc.enable()
