@@ -159,41 +159,62 @@ int ReRead(PyObject* parser, PyObject* lines, const Edit& edit, const char* data
   return status;
 }
 
-PyObject* RefuseChangedLines() {
-  PyErr_SetString(PyExc_RuntimeError, "lines changed during the update");
-  return nullptr;
-}
-
-// The list's items, held in a list of our own for the whole update: reading allocates, a
-// collection that sets off may run a host's finalizer, and that may change the list. Returns a
-// new list, or nullptr with an exception set.
-PyObject* HoldLines(PyObject* lines) {
-  const Py_ssize_t count = PyList_GET_SIZE(lines);
-  PyRef held = PyRef::Steal(PyList_New(count));
-  if (!held) return nullptr;
-  if (PyList_GET_SIZE(lines) != count) return RefuseChangedLines();
-  for (Py_ssize_t i = 0; i < count; i++) {
-    PyObject* item = PyList_GET_ITEM(lines, i);
-    Py_INCREF(item);
-    PyList_SET_ITEM(held.Get(), i, item);
-  }
-  return held.Release();
-}
-
-// True when `lines` still holds exactly the items of `held`.
-bool SameItems(PyObject* lines, PyObject* held) {
-  const Py_ssize_t count = PyList_GET_SIZE(held);
-  return PyList_GET_SIZE(lines) == count &&
-         (count == 0 || memcmp(PySequence_Fast_ITEMS(lines), PySequence_Fast_ITEMS(held),
-                               static_cast<size_t>(count) * sizeof(PyObject*)) == 0);
-}
-
 // Moves the lines from index `from` on by `lineDelta` physical lines and `byteDelta` bytes.
-void MoveLines(PyObject* held, Py_ssize_t from, int64_t lineDelta, int64_t byteDelta) {
-  for (Py_ssize_t i = from; i < PyList_GET_SIZE(held); i++) {
-    LineAt(held, i)->fFirstLine += static_cast<int32_t>(lineDelta);
-    LineAt(held, i)->fOffset += byteDelta;
+void MoveLines(PyObject* lines, Py_ssize_t from, int64_t lineDelta, int64_t byteDelta) {
+  for (Py_ssize_t i = from; i < PyList_GET_SIZE(lines); i++) {
+    LineAt(lines, i)->fFirstLine += static_cast<int32_t>(lineDelta);
+    LineAt(lines, i)->fOffset += byteDelta;
   }
+}
+
+// Updates `lines` for the edit, from the new text [data, end). Returns the result, or nullptr
+// with an exception set and `lines` unchanged.
+PyObject* Update(PyObject* parser, PyObject* lines, const Edit& edit, const char* data,
+                 const char* end) {
+  if (CheckLines(lines) != 0) return nullptr;
+  const int64_t start = ReReadStart(lines, edit);
+  bool whole = true;
+  const char* from = StartOf(lines, data, end, start, &whole);
+  if (!from) return nullptr;
+  int64_t passed = 0;  // the new lines must be in the text: count them, and no further
+  SkipLines(from, end, edit.fFirst + edit.fNewCount - start, &passed);
+  if (!whole || passed < edit.fFirst + edit.fNewCount - start) {
+    PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
+    return nullptr;
+  }
+  PyRef added = PyRef::Steal(PyList_New(0));
+  int64_t stop = 0;
+  int64_t stopOffset = 0;
+  if (!added ||
+      ReRead(parser, lines, edit, data, end, start, added.Get(), &stop, &stopOffset) != 0)
+    return nullptr;
+  // Old lines from the start up to where the re-read stopped, in the old numbering, go. The
+  // ones after it keep their text, moved by the bytes and the lines that the edit changed.
+  const Py_ssize_t index = FirstLineFrom(lines, start);
+  const Py_ssize_t kept = stop == INT64_MAX ? PyList_GET_SIZE(lines)
+                                            : FirstLineFrom(lines, stop - edit.Delta());
+  int64_t byteDelta = 0;
+  if (kept < PyList_GET_SIZE(lines)) {
+    const LogicalLine* next = LineAt(lines, kept);
+    const char* at = SkipLines(data + stopOffset, end, next->fFirstLine + edit.Delta() - stop,
+                               &passed);
+    byteDelta = (at - data) - next->fOffset;
+    const LogicalLine* last = LineAt(lines, PyList_GET_SIZE(lines) - 1);
+    if (last->fOffset + byteDelta >= end - data) {  // the lines run past the new text
+      RefuseLines();
+      return nullptr;
+    }
+  }
+  PyRef result = PyRef::Steal(Py_BuildValue("nnO", index, kept - index, added.Get()));
+  if (!result) return nullptr;
+  // The later lines move before the list changes, and back if it cannot: the old lines that the
+  // list releases may run a host's code, which must find the list whole.
+  MoveLines(lines, kept, edit.Delta(), byteDelta);
+  if (PyList_SetSlice(lines, index, kept, added.Get()) != 0) {
+    MoveLines(lines, kept, -edit.Delta(), -byteDelta);
+    return nullptr;
+  }
+  return result.Release();
 }
 
 PyDoc_STRVAR(kUpdateLogicalLineListDoc,
@@ -225,58 +246,17 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
     return nullptr;
   }
   const Edit edit{.fFirst = first, .fOldCount = oldCount, .fNewCount = newCount};
-  const char* data = static_cast<const char*>(view.buf);
-  const char* end = data + view.len;
   if (first < 0 || oldCount < 0 || newCount < 0) {
     PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
     return nullptr;
   }
-  PyRef held = PyRef::Steal(HoldLines(lines));
-  if (!held || CheckLines(held.Get()) != 0) return nullptr;
-  const int64_t start = ReReadStart(held.Get(), edit);
-  bool whole = true;
-  const char* from = StartOf(held.Get(), data, end, start, &whole);
-  if (!from) return nullptr;
-  int64_t passed = 0;  // the new lines must be in the text: count them, and no further
-  SkipLines(from, end, edit.fFirst + edit.fNewCount - start, &passed);
-  if (!whole || passed < edit.fFirst + edit.fNewCount - start) {
-    PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
-    return nullptr;
-  }
-  PyRef added = PyRef::Steal(PyList_New(0));
-  int64_t stop = 0;
-  int64_t stopOffset = 0;
-  if (!added ||
-      ReRead(self, held.Get(), edit, data, end, start, added.Get(), &stop, &stopOffset) != 0)
-    return nullptr;
-  // Old lines from the start up to where the re-read stopped, in the old numbering, go. The
-  // ones after it keep their text, moved by the bytes and the lines that the edit changed.
-  const Py_ssize_t index = FirstLineFrom(held.Get(), start);
-  const Py_ssize_t kept = stop == INT64_MAX ? PyList_GET_SIZE(held.Get())
-                                            : FirstLineFrom(held.Get(), stop - edit.Delta());
-  int64_t byteDelta = 0;
-  if (kept < PyList_GET_SIZE(held.Get())) {
-    const LogicalLine* next = LineAt(held.Get(), kept);
-    const char* at = SkipLines(data + stopOffset, end, next->fFirstLine + edit.Delta() - stop,
-                               &passed);
-    byteDelta = (at - data) - next->fOffset;
-    const LogicalLine* last = LineAt(held.Get(), PyList_GET_SIZE(held.Get()) - 1);
-    if (last->fOffset + byteDelta >= view.len) {  // the lines run past the new text
-      RefuseLines();
-      return nullptr;
-    }
-  }
-  PyRef result = PyRef::Steal(Py_BuildValue("nnO", index, kept - index, added.Get()));
-  if (!result) return nullptr;
-  if (!SameItems(lines, held.Get())) return RefuseChangedLines();
-  // The later lines move first, and move back if the list cannot take the new ones; nothing
-  // between here and the end runs code of the host's.
-  MoveLines(held.Get(), kept, edit.Delta(), byteDelta);
-  if (PyList_SetSlice(lines, index, kept, added.Get()) != 0) {
-    MoveLines(held.Get(), kept, -edit.Delta(), -byteDelta);
-    return nullptr;
-  }
-  return result.Release();
+  // Reading allocates, and an allocation may set off a collection, which may run a host's
+  // finalizer that changes the list under the update; the collector waits until it is done.
+  const int collecting = PyGC_Disable();
+  const char* data = static_cast<const char*>(view.buf);
+  PyObject* result = Update(self, lines, edit, data, data + view.len);
+  if (collecting) PyGC_Enable();
+  return result;
 }
 
 }  // namespace
