@@ -2,7 +2,7 @@
 
 OPTIONS = [
     ("--exhaustive", "compare token starts on every 3-byte input (about a minute)"),
-    ("--full-stdlib", "check every standard library file against the model and tokenize"),
+    ("--full-stdlib", "check every standard library file against the model"),
 ]
 
 

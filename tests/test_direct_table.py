@@ -30,8 +30,7 @@ def test_capsules_and_the_empty_record():
     assert DIRECT.GetArgNameCount(line) == 0
     with pytest.raises(ValueError, match="^Tried to get argument name from a non-function def line$"):
         DIRECT.GetArgName(line, 0)
-    for entry in (("x", object()), "y", ()):
-        assert DIRECT.AppendAttribDirect(line, entry) == 0
+    assert [DIRECT.AppendAttribDirect(line, entry) for entry in (("x", object()), "y", ())] == [0] * 3
     assert DIRECT.GetNamesDefined(line) == line.fNamesDefined == ("x", "y", ())
     assert DIRECT.GetArgNameCount(line) == 0  # attributes are no argument names
 
@@ -63,8 +62,7 @@ def test_token_type_entries():
     assert [DIRECT.GetStringTokenTypeDirect(text, skip) for text, skip in [
         (b"42", 0), ("\u00e9t\u00e9", 0), ("<errortoken> 'abc", 1), (b"<errortoken> ", 1),
         (b"<errortoken>", 1)]] == [2, 1, 3, 201, 20]  # a bare prefix leaves nothing; too short
-    with pytest.raises(IndexError, match="^Invalid token index$"):
-        DIRECT.GetTokenTypeDirect(line, 3, 0)
+    pytest.raises(IndexError, DIRECT.GetTokenTypeDirect, line, 3, 0).match("^Invalid token index$")
     with pytest.raises(TypeError, match="^String must be a bytes or unicode instance$"):
         DIRECT.GetStringTokenTypeDirect(bytearray(b"x"), 0)
     pytest.raises(UnicodeEncodeError, DIRECT.GetStringTokenTypeDirect, "\ud800", 1)

@@ -39,19 +39,20 @@ def outcome(read):
         return type(error).__name__, "" if isinstance(error, SystemError) else str(error)
 
 
-def model_view(line):
+def decoded(text):
     try:
-        text = line["line_text"] and line["line_text"].decode()
+        return text()
     except UnicodeDecodeError:
-        text = "<undecodable>"
+        return "<undecodable>"
+
+
+def model_view(line):
+    text = decoded(lambda: line["line_text"] and line["line_text"].decode())
     return dict(line, tokens=[t.decode("utf-8", "replace") for t in line["tokens"]], line_text=text)
 
 
 def module_view(line):
-    try:
-        text = line.fLineText
-    except UnicodeDecodeError:
-        text = "<undecodable>"
+    text = decoded(lambda: line.fLineText)
     tokens = [t for t, _ in line.fTokens]
     assert [line.GetTokenString(i) for i in range(line.fTokenCount)] == tokens
     return dict(
@@ -118,17 +119,15 @@ def hostile_chunks(seed, nul=False):
     rng = random.Random(seed)
     data = b"".join(rng.choices(list(FRAGMENTS), list(FRAGMENTS.values()), k=rng.randint(1, 60)))
     data = (b"\xef\xbb\xbf" if rng.random() < 0.1 else b"") + data  # a byte-order mark
+    if nul:
+        at = rng.randrange(len(data) + 1)
+        data = data[:at] + b"\0" + data[at:]
     # Mostly cut after line feeds, as readline does, but also anywhere, so that chunks end
     # without a terminator or hold several line breaks.
     cuts = {i + 1 for i, c in enumerate(data) if c == 0x0A and rng.random() < 0.8}
     cuts |= {rng.randrange(1, len(data) + 1) for _ in range(rng.randint(0, 4))} | {len(data)}
     bounds = [0] + sorted(cuts)
-    chunks = [data[a:b] for a, b in zip(bounds, bounds[1:])]
-    if nul:
-        i = rng.randrange(len(chunks))
-        at = rng.randrange(len(chunks[i]) + 1)
-        chunks[i] = chunks[i][:at] + b"\0" + chunks[i][at:]
-    return chunks
+    return [data[a:b] for a, b in zip(bounds, bounds[1:])]
 
 
 @pytest.mark.parametrize("block", range(20))

@@ -57,10 +57,9 @@ def test_short_and_random_inputs_match_model(request):
 ])
 def test_token_kind_and_text(source, index, kind, kind_skipped, text, text_skipped):
     (line,) = read(source, remove_comments=False)
-    assert (line.GetTokenType(index), line.GetTokenType(i=index, skip_error_prefix=7)) == (
-        kind, kind_skipped)
-    assert (line.GetTokenString(index), line.GetTokenString(skip_error_prefix=True, i=index)) == (
-        text, text_skipped)
+    assert (line.GetTokenType(index), line.GetTokenType(i=index, skip_error_prefix=7),
+            line.GetTokenString(index), line.GetTokenString(skip_error_prefix=True, i=index)) == (
+        kind, kind_skipped, text, text_skipped)
 
 
 @pytest.mark.parametrize("method", ["GetTokenType", "GetTokenString"])

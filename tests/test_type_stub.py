@@ -42,10 +42,8 @@ def test_stub_names_what_the_module_has(tmp_path):
     for name, runtime in [("LogicalLine", logicalline.LogicalLineType),
                           ("LogicalLineParser", type(logicalline.CreateLogicalLineParser()))]:
         assert classes[name] == set(dir(runtime)) - set(dir(object))
-    result = run_mypy("logicalline", tool=("mypy.stubtest",))  # names, kinds and signatures
-    assert result.returncode == 0, result.stdout + result.stderr
-    result = run_mypy(HOST_SCRIPT)
-    assert result.returncode == 0, result.stdout + result.stderr
+    for result in (run_mypy("logicalline", tool=("mypy.stubtest",)), run_mypy(HOST_SCRIPT)):
+        assert result.returncode == 0, result.stdout + result.stderr  # stubtest: names, kinds
     (tmp_path / "misuse.py").write_text(MISUSE)
     errors = [line for line in run_mypy(tmp_path / "misuse.py").stdout.splitlines() if "error:" in line]
     assert sorted({int(line.split(":")[1]) for line in errors}) == [3, 4, 5, 6], errors
