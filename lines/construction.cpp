@@ -83,9 +83,9 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts) {
   PyRef owner = PyRef::Steal(reinterpret_cast<PyObject*>(line));  // releases a half-built line
   if (FillStorage(line, parts) != 0) return nullptr;
   line->fIndentLevel = static_cast<int16_t>(parts.fIndentLevel);
-  line->fFirstLine = parts.fFirstLine;
+  line->fStoredFirstLine = parts.fFirstLine;
   line->fLineCount = static_cast<int16_t>(parts.fLineCount);
-  line->fOffset = parts.fOffset;
+  line->fStoredOffset = parts.fOffset;
   LineType type = kUnknown;
   if (ClassifyLogicalLine(line->fTokenArray, line->fTokenCount, &type, &line->fLocalScopeName) != 0)
     return nullptr;

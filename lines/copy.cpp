@@ -14,7 +14,7 @@
 PyObject* CopyLogicalLine(LogicalLine* source) {
   const char* text = source->fLineText;
   const LineParts parts = {.fIndentLevel = source->fIndentLevel,
-                           .fFirstLine = source->fFirstLine,
+                           .fFirstLine = static_cast<int>(FirstLineOf(source)),
                            .fLineCount = source->fLineCount,
                            .fTokens = source->fTokenArray,
                            .fPositions = source->fTokenPositions,
@@ -24,7 +24,7 @@ PyObject* CopyLogicalLine(LogicalLine* source) {
                            .fIncomplete = (source->fFlags & kIncompleteFlag) != 0,
                            .fLineText = text,
                            .fLineTextLength = text ? strlen(text) : 0,
-                           .fOffset = source->fOffset};
+                           .fOffset = OffsetOf(source)};
   PyRef copy = PyRef::Steal(CreateNativeLogicalLine(parts));
   if (!copy) return nullptr;
   LogicalLine* line = AsLine(copy.Get());

@@ -39,6 +39,7 @@ void LineDealloc(PyObject* self) {
   // The positions and the line text live in the token array's block.
   for (int i = 0; i < line->fTokenCount; i++) Py_DECREF(line->fTokenArray[i]);
   free(line->fTokenArray);
+  DetachLine(line);
   ClearAppended(line);
   Py_XDECREF(line->fScopeName);
   Py_XDECREF(line->fTokensTuple);
@@ -68,7 +69,6 @@ LogicalLine* NewLogicalLine() {
   const ObjectList empty = {.fItems = nullptr, .fCount = 0, .fCapacity = 0};
   line->fTokenArray = nullptr;
   line->fTokenPositions = nullptr;
-  line->fFirstLine = 0;
   line->fTokenCount = 0;
   line->fIndentLevel = 0;
   line->fLineCount = 0;
@@ -80,7 +80,10 @@ LogicalLine* NewLogicalLine() {
   line->fArgTypeEquivs = empty;
   line->fLineText = nullptr;
   line->fTokensTuple = nullptr;
-  line->fOffset = 0;
+  line->fStoredFirstLine = 0;
+  line->fStoredOffset = 0;
+  line->fShiftTable = nullptr;
+  line->fGroup = 0;
   Py_INCREF(Py_None);
   line->fLocalScopeName = Py_None;
   return line;
@@ -103,4 +106,32 @@ PyObject* TokenAt(LogicalLine* line, int index) {
     return nullptr;
   }
   return line->fTokenArray[index];
+}
+
+void SetFirstLine(LogicalLine* line, int64_t first) {
+  line->fStoredFirstLine += first - FirstLineOf(line);
+}
+
+void MoveLine(LogicalLine* line, int64_t lines, int64_t bytes) {
+  line->fStoredFirstLine += lines;
+  line->fStoredOffset += bytes;
+}
+
+void AttachLine(LogicalLine* line, ShiftTable* table, uint32_t group) {
+  ShiftGroup& joined = table->fGroups[group];
+  HoldShiftTable(table);
+  joined.fMembers++;
+  line->fShiftTable = table;
+  line->fGroup = group;
+  MoveLine(line, -joined.fLineShift, -joined.fByteShift);
+}
+
+void DetachLine(LogicalLine* line) {
+  ShiftTable* table = line->fShiftTable;
+  if (!table) return;
+  ShiftGroup& left = table->fGroups[line->fGroup];
+  MoveLine(line, left.fLineShift, left.fByteShift);
+  left.fMembers--;
+  line->fShiftTable = nullptr;
+  DropShiftTable(table);
 }

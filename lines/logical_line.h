@@ -9,6 +9,7 @@
 
 #include "core/object_list.h"
 #include "core/token_position.h"
+#include "lines/shift_table.h"
 
 enum LineFlag : uint8_t {
   kParsedFlag = 1,
@@ -22,7 +23,6 @@ struct LogicalLine {
   PyObject** fTokenArray;          // fTokenCount owned bytes objects; a heap block that also
                                    // holds fTokenPositions and fLineText
   TokenPosition* fTokenPositions;  // fTokenCount positions inside fTokenArray's block
-  int32_t fFirstLine;
   int32_t fTokenCount;
   int16_t fIndentLevel;
   int16_t fLineCount;
@@ -35,13 +35,42 @@ struct LogicalLine {
   char* fLineText;             // own NUL-terminated copy inside fTokenArray's block, or null
   PyObject* fTokensTuple;      // cache of fTokens; the tokens never change once set
   PyObject* fLocalScopeName;   // the defined name on a class or function line, else None
-  int64_t fOffset;             // where its first physical line starts in the text read
+  // Where the line starts: its first physical line, and that line's offset in the text read.
+  // Both are stored less the shift of its group when it shares the numbering of an updated
+  // list; read them with FirstLineOf and OffsetOf.
+  int64_t fStoredFirstLine;
+  int64_t fStoredOffset;
+  ShiftTable* fShiftTable;  // a hold on the numbering it shares, or null
+  uint32_t fGroup;          // its group in fShiftTable
 };
 
 // The type. Its methods and attributes are the Python surface's, set before it is readied.
 extern PyTypeObject LogicalLineType;
 
 inline LogicalLine* AsLine(PyObject* object) { return reinterpret_cast<LogicalLine*>(object); }
+
+inline int64_t FirstLineOf(const LogicalLine* line) {
+  const ShiftTable* table = line->fShiftTable;
+  return line->fStoredFirstLine + (table ? table->fGroups[line->fGroup].fLineShift : 0);
+}
+
+inline int64_t OffsetOf(const LogicalLine* line) {
+  const ShiftTable* table = line->fShiftTable;
+  return line->fStoredOffset + (table ? table->fGroups[line->fGroup].fByteShift : 0);
+}
+
+// Sets the first line, keeping the line in its group.
+void SetFirstLine(LogicalLine* line, int64_t first);
+
+// Moves the line by `lines` physical lines and `bytes` bytes, on its own.
+void MoveLine(LogicalLine* line, int64_t lines, int64_t bytes);
+
+// Has the line share a table's numbering, in group `group`, keeping its numbers. The line
+// must share none yet.
+void AttachLine(LogicalLine* line, ShiftTable* table, uint32_t group);
+
+// Takes the line out of the numbering it shares, if any, keeping its numbers.
+void DetachLine(LogicalLine* line);
 
 // Returns a new record in the fresh state (no tokens, type kUnknown, fLocalScopeName None).
 LogicalLine* NewLogicalLine();

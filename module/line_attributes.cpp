@@ -51,7 +51,9 @@ PyObject* GetTabsInIndent(PyObject* self, void*) { return FlagValue(self, kTabsI
 PyObject* GetSpacesInIndent(PyObject* self, void*) { return FlagValue(self, kSpacesInIndentFlag); }
 PyObject* GetIncomplete(PyObject* self, void*) { return FlagValue(self, kIncompleteFlag); }
 PyObject* GetIndentLevel(PyObject* self, void*) { return PyLong_FromLong(AsLine(self)->fIndentLevel); }
-PyObject* GetFirstLine(PyObject* self, void*) { return PyLong_FromLong(AsLine(self)->fFirstLine); }
+PyObject* GetFirstLine(PyObject* self, void*) {
+  return PyLong_FromLongLong(FirstLineOf(AsLine(self)));
+}
 PyObject* GetLineCount(PyObject* self, void*) { return PyLong_FromLong(AsLine(self)->fLineCount); }
 PyObject* GetTokenCount(PyObject* self, void*) { return PyLong_FromLong(AsLine(self)->fTokenCount); }
 PyObject* GetNamesDefined(PyObject* self, void*) { return NamesDefined(AsLine(self)); }

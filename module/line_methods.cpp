@@ -103,7 +103,7 @@ PyObject* SetLineRange(PyObject* self, PyObject* args) {
   int first = 0;
   int count = 0;
   if (!PyArg_ParseTuple(args, "ii", &first, &count)) return nullptr;
-  AsLine(self)->fFirstLine = first;
+  SetFirstLine(AsLine(self), first);
   AsLine(self)->fLineCount = static_cast<int16_t>(count);  // keeps the low 16 bits
   Py_RETURN_NONE;
 }

@@ -18,6 +18,7 @@
 #include "core/py_ref.h"
 #include "lines/construction.h"
 #include "lines/logical_line.h"
+#include "lines/shift_table.h"
 #include "module/parser.h"
 
 namespace {
@@ -31,9 +32,27 @@ struct Edit {
   int64_t Delta() const { return fNewCount - fOldCount; }
 };
 
-LogicalLine* LineAt(PyObject* lines, Py_ssize_t i) { return AsLine(PyList_GET_ITEM(lines, i)); }
+// A table is built with this many lines in each group, and the lines a re-read adds join the
+// group before them while it holds no more than the limit: an update moves the later members
+// of its own group one by one, and every later group as a whole.
+constexpr size_t kGroupLines = 32;
+constexpr size_t kGroupLimit = 64;
 
-int64_t EndOf(const LogicalLine* line) { return int64_t{line->fFirstLine} + line->fLineCount; }
+// Item i of the list as a line, or nullptr: the list must hold nothing but our lines.
+LogicalLine* LineIfOurs(PyObject* lines, Py_ssize_t i) {
+  PyObject* item = PyList_GET_ITEM(lines, i);
+  return Py_TYPE(item) == &LogicalLineType ? AsLine(item) : nullptr;
+}
+
+// Item i of the list, or nullptr with TypeError set when it is not one of our lines.
+LogicalLine* LineAt(PyObject* lines, Py_ssize_t i) {
+  LogicalLine* line = LineIfOurs(lines, i);
+  if (!line)
+    PyErr_SetString(PyExc_TypeError, "lines must hold only the LogicalLine objects of a read");
+  return line;
+}
+
+int64_t EndOf(const LogicalLine* line) { return FirstLineOf(line) + line->fLineCount; }
 
 // Moves p over `count` physical lines, cut as BytesIO.readline cuts them; stores in *passed
 // how many there were before the end.
@@ -45,28 +64,36 @@ const char* SkipLines(const char* p, const char* end, int64_t count, int64_t* pa
   return p;
 }
 
-// Returns the index of the first line that starts at or after physical line `number`.
-Py_ssize_t FirstLineFrom(PyObject* lines, int64_t number) {
+// Stores in *index the index of the first line that starts at or after physical line
+// `number`. Returns 0, or -1 with an exception set.
+int FirstLineFrom(PyObject* lines, int64_t number, Py_ssize_t* index) {
   Py_ssize_t low = 0;
   Py_ssize_t high = PyList_GET_SIZE(lines);
   while (low < high) {
     const Py_ssize_t middle = low + (high - low) / 2;
-    if (LineAt(lines, middle)->fFirstLine < number) {
+    const LogicalLine* line = LineAt(lines, middle);
+    if (!line) return -1;
+    if (FirstLineOf(line) < number) {
       low = middle + 1;
     } else {
       high = middle;
     }
   }
-  return low;
+  *index = low;
+  return 0;
 }
 
-// True when reading the new text from physical line `number` goes on as the old read did from
+// Whether reading the new text from physical line `number` goes on as the old read did from
 // line `old`: the old read started afresh there (no line runs over it), and neither or both are
-// the first line, where a byte-order mark is skipped.
-bool ReadsOnAsBefore(PyObject* lines, int64_t number, int64_t old) {
-  if ((number == 0) != (old == 0)) return false;
-  const Py_ssize_t next = FirstLineFrom(lines, old);
-  return next == 0 || EndOf(LineAt(lines, next - 1)) <= old;
+// the first line, where a byte-order mark is skipped. Returns 1 or 0, or -1 with an exception.
+int ReadsOnAsBefore(PyObject* lines, int64_t number, int64_t old) {
+  if ((number == 0) != (old == 0)) return 0;
+  Py_ssize_t next = 0;
+  if (FirstLineFrom(lines, old, &next) != 0) return -1;
+  if (next == 0) return 1;
+  const LogicalLine* before = LineAt(lines, next - 1);
+  if (!before) return -1;
+  return EndOf(before) <= old;
 }
 
 int RefuseLines() {
@@ -74,21 +101,57 @@ int RefuseLines() {
   return -1;
 }
 
-// Checks that `lines` is what this module read: its own line objects, in order, without
-// overlaps. Returns 0, or -1 with an exception set.
-int CheckLines(PyObject* lines) {
+// Builds a new table for the list, its lines in groups of kGroupLines, checking on the way that
+// they are our lines, in order, without overlaps. Returns the table, with the caller's hold,
+// or nullptr with an exception set and nothing changed.
+ShiftTable* BuildTable(PyObject* lines) {
+  const Py_ssize_t size = PyList_GET_SIZE(lines);
   int64_t end = 0;
-  for (Py_ssize_t i = 0; i < PyList_GET_SIZE(lines); i++) {
-    PyObject* item = PyList_GET_ITEM(lines, i);
-    if (Py_TYPE(item) != &LogicalLineType) {
-      PyErr_SetString(PyExc_TypeError, "lines must hold only the LogicalLine objects of a read");
-      return -1;
+  for (Py_ssize_t i = 0; i < size; i++) {
+    const LogicalLine* line = LineAt(lines, i);
+    if (!line) return nullptr;
+    if (FirstLineOf(line) < end || line->fLineCount < 1 || OffsetOf(line) < 0) {
+      RefuseLines();
+      return nullptr;
     }
-    const LogicalLine* line = AsLine(item);
-    if (line->fFirstLine < end || line->fLineCount < 1 || line->fOffset < 0) return RefuseLines();
     end = EndOf(line);
   }
-  return 0;
+  ShiftTable* table = NewShiftTable();
+  if (!table || ReserveGroups(table, (static_cast<size_t>(size) + kGroupLines - 1) /
+                                         kGroupLines) != 0) {
+    if (table) DropShiftTable(table);
+    PyErr_NoMemory();
+    return nullptr;
+  }
+  uint32_t group = 0;
+  for (Py_ssize_t i = 0; i < size; i++) {
+    if (static_cast<size_t>(i) % kGroupLines == 0) group = InsertGroup(table, table->fCount);
+    LogicalLine* line = AsLine(PyList_GET_ITEM(lines, i));
+    DetachLine(line);
+    AttachLine(line, table, group);
+  }
+  return table;
+}
+
+// The table that numbers the list, with a hold for the caller: the one its lines share, or a
+// new one when they share none yet, when the list is not as the last update left it, or when
+// edits have split its groups so finely that moving them would cost more than building it
+// again. Returns nullptr with an exception set.
+ShiftTable* TableFor(PyObject* lines) {
+  const Py_ssize_t size = PyList_GET_SIZE(lines);
+  if (size > 0) {
+    const LogicalLine* first = LineAt(lines, 0);
+    const LogicalLine* last = first ? LineAt(lines, size - 1) : nullptr;
+    if (!last) return nullptr;
+    ShiftTable* table = first->fShiftTable;
+    if (table && table == last->fShiftTable && table->fList == lines &&
+        table->fListLength == static_cast<size_t>(size) &&
+        table->fCount <= 2 * (static_cast<size_t>(size) / kGroupLines) + 64) {
+      HoldShiftTable(table);
+      return table;
+    }
+  }
+  return BuildTable(lines);
 }
 
 // Where physical line `number` starts, when the text up to it is as the lines were read: from
@@ -97,28 +160,32 @@ int CheckLines(PyObject* lines) {
 // tells whether the text has that many lines.
 const char* StartOf(PyObject* lines, const char* data, const char* end, int64_t number,
                     bool* whole) {
-  const Py_ssize_t next = FirstLineFrom(lines, number + 1);
+  Py_ssize_t next = 0;
+  if (FirstLineFrom(lines, number + 1, &next) != 0) return nullptr;
   const LogicalLine* known = next > 0 ? LineAt(lines, next - 1) : nullptr;
-  if (known && known->fOffset > end - data) {
+  if (next > 0 && !known) return nullptr;
+  if (known && OffsetOf(known) > end - data) {
     RefuseLines();
     return nullptr;
   }
-  const int64_t count = number - (known ? known->fFirstLine : 0);
+  const int64_t count = number - (known ? FirstLineOf(known) : 0);
   int64_t passed = 0;
-  const char* at = SkipLines(known ? data + known->fOffset : data, end, count, &passed);
+  const char* at = SkipLines(known ? data + OffsetOf(known) : data, end, count, &passed);
   *whole = passed == count;
   return at;
 }
 
 // Where the re-read starts: the first line whose reading could have seen the edited lines.
 // Only the last line before the edit can have: it runs into the edit, or ended open and so
-// read the first edited line to decide that it ended.
+// read the first edited line to decide that it ended. Returns -1 with an exception set.
 int64_t ReReadStart(PyObject* lines, const Edit& edit) {
-  const Py_ssize_t next = FirstLineFrom(lines, edit.fFirst);
+  Py_ssize_t next = 0;
+  if (FirstLineFrom(lines, edit.fFirst, &next) != 0) return -1;
   if (next == 0) return edit.fFirst;
   const LogicalLine* before = LineAt(lines, next - 1);
+  if (!before) return -1;
   const int64_t seen = EndOf(before) + ((before->fFlags & kIncompleteFlag) ? 1 : 0);
-  return seen > edit.fFirst ? before->fFirstLine : edit.fFirst;
+  return seen > edit.fFirst ? FirstLineOf(before) : edit.fFirst;
 }
 
 // Reads the new text from physical line `start` until the reader starts afresh after the edit
@@ -137,21 +204,23 @@ int ReRead(PyObject* parser, PyObject* lines, const Edit& edit, const char* data
   state.fSourceOffset = from - data;
   int status = 0;
   const int64_t editEnd = edit.fFirst + edit.fNewCount;
-  while (!state.fAtEnd &&
-         !(state.fLineNumber >= editEnd &&
-           ReadsOnAsBefore(lines, state.fLineNumber, state.fLineNumber - edit.Delta()))) {
+  while (!state.fAtEnd && status == 0) {
+    if (state.fLineNumber >= editEnd) {
+      const int same = ReadsOnAsBefore(lines, state.fLineNumber,
+                                       state.fLineNumber - edit.Delta());
+      if (same != 0) {
+        status = same < 0 ? -1 : 0;
+        break;
+      }
+    }
     LineParts parts;
     const int built = BuildLogicalLine(&state, &parts);
-    if (built < 0) {
-      status = -1;
-      break;
+    if (built <= 0) {
+      status = built;
+      continue;
     }
-    if (built == 0) continue;
     PyRef line = PyRef::Steal(CreateNativeLogicalLine(parts));
-    if (!line || PyList_Append(added, line.Get()) != 0) {
-      status = -1;
-      break;
-    }
+    if (!line || PyList_Append(added, line.Get()) != 0) status = -1;
   }
   *stop = state.fAtEnd ? INT64_MAX : state.fLineNumber;
   *stopOffset = state.fPending.fLength ? state.fPendingOffset : state.fSourceOffset;
@@ -159,20 +228,73 @@ int ReRead(PyObject* parser, PyObject* lines, const Edit& edit, const char* data
   return status;
 }
 
-// Moves the lines from index `from` on by `lineDelta` physical lines and `byteDelta` bytes.
-void MoveLines(PyObject* lines, Py_ssize_t from, int64_t lineDelta, int64_t byteDelta) {
-  for (Py_ssize_t i = from; i < PyList_GET_SIZE(lines); i++) {
-    LineAt(lines, i)->fFirstLine += static_cast<int32_t>(lineDelta);
-    LineAt(lines, i)->fOffset += byteDelta;
+// Inserts groups for `count` lines at `position` in the order, and attaches the lines from
+// index `from` of the list to them. Room for the groups must have been reserved.
+void GroupNewLines(PyObject* lines, ShiftTable* table, Py_ssize_t from, Py_ssize_t count,
+                   size_t position) {
+  uint32_t group = 0;
+  for (Py_ssize_t i = 0; i < count; i++) {
+    if (static_cast<size_t>(i) % kGroupLines == 0) group = InsertGroup(table, position++);
+    AttachLine(AsLine(PyList_GET_ITEM(lines, from + i)), table, group);
   }
 }
 
-// Updates `lines` for the edit, from the new text [data, end). Returns the result, or nullptr
-// with an exception set and `lines` unchanged.
-PyObject* Update(PyObject* parser, PyObject* lines, const Edit& edit, const char* data,
-                 const char* end) {
-  if (CheckLines(lines) != 0) return nullptr;
+// After the list's slice from `index` took the `added` new lines, which are not numbered yet:
+// numbers them, and moves every later line by the edit. The new lines join the group of the
+// line before them, or groups of their own; the later lines of that group move one by one (to
+// a group of their own when the new lines did not join), and every later group as a whole.
+// Cannot fail: the table has room for ReservedGroups(added) more groups.
+void Renumber(PyObject* lines, ShiftTable* table, Py_ssize_t index, Py_ssize_t added,
+              int64_t lineDelta, int64_t byteDelta) {
+  const Py_ssize_t size = PyList_GET_SIZE(lines);
+  const Py_ssize_t after = index + added;
+  LogicalLine* before = index > 0 ? LineIfOurs(lines, index - 1) : nullptr;
+  if (before && before->fShiftTable != table) before = nullptr;
+  LogicalLine* next = after < size ? LineIfOurs(lines, after) : nullptr;
+  if (next && next->fShiftTable != table) next = nullptr;
+  const bool join = before && table->fGroups[before->fGroup].fMembers +
+                                      static_cast<size_t>(added) <= kGroupLimit;
+  size_t moveFrom = table->fCount;  // the first group that moves as a whole
+  if (next) {
+    const uint32_t group = next->fGroup;
+    moveFrom = table->fGroups[group].fPosition;
+    if (before && before->fGroup == group) {  // the group holds lines on both sides
+      const uint32_t target = join ? group : InsertGroup(table, moveFrom + 1);
+      for (Py_ssize_t i = after; i < size; i++) {
+        LogicalLine* line = LineIfOurs(lines, i);
+        if (!line || line->fShiftTable != table || line->fGroup != group) break;
+        MoveLine(line, lineDelta, byteDelta);
+        if (!join) {
+          DetachLine(line);
+          AttachLine(line, table, target);
+        }
+      }
+      moveFrom = table->fGroups[target].fPosition + 1;
+    }
+  }
+  ShiftGroupsFrom(table, moveFrom, lineDelta, byteDelta);
+  if (join) {
+    for (Py_ssize_t i = index; i < after; i++)
+      AttachLine(AsLine(PyList_GET_ITEM(lines, i)), table, before->fGroup);
+  } else {
+    const size_t position = before ? table->fGroups[before->fGroup].fPosition + 1
+                            : next ? table->fGroups[next->fGroup].fPosition
+                                   : table->fCount;
+    GroupNewLines(lines, table, index, added, position);
+  }
+}
+
+// The groups that Renumber may make for `added` new lines.
+size_t ReservedGroups(Py_ssize_t added) {
+  return 1 + (static_cast<size_t>(added) + kGroupLines - 1) / kGroupLines;
+}
+
+// Updates `lines`, numbered by `table`, for the edit, from the new text [data, end). Returns
+// the result, or nullptr with an exception set and `lines` unchanged.
+PyObject* UpdateNumbered(PyObject* parser, PyObject* lines, ShiftTable* table, const Edit& edit,
+                         const char* data, const char* end) {
   const int64_t start = ReReadStart(lines, edit);
+  if (start < 0) return nullptr;
   bool whole = true;
   const char* from = StartOf(lines, data, end, start, &whole);
   if (!from) return nullptr;
@@ -190,31 +312,51 @@ PyObject* Update(PyObject* parser, PyObject* lines, const Edit& edit, const char
     return nullptr;
   // Old lines from the start up to where the re-read stopped, in the old numbering, go. The
   // ones after it keep their text, moved by the bytes and the lines that the edit changed.
-  const Py_ssize_t index = FirstLineFrom(lines, start);
-  const Py_ssize_t kept = stop == INT64_MAX ? PyList_GET_SIZE(lines)
-                                            : FirstLineFrom(lines, stop - edit.Delta());
+  const Py_ssize_t size = PyList_GET_SIZE(lines);
+  Py_ssize_t index = 0;
+  Py_ssize_t kept = size;
+  if (FirstLineFrom(lines, start, &index) != 0 ||
+      (stop != INT64_MAX && FirstLineFrom(lines, stop - edit.Delta(), &kept) != 0))
+    return nullptr;
   int64_t byteDelta = 0;
-  if (kept < PyList_GET_SIZE(lines)) {
+  if (kept < size) {
     const LogicalLine* next = LineAt(lines, kept);
-    const char* at = SkipLines(data + stopOffset, end, next->fFirstLine + edit.Delta() - stop,
+    const LogicalLine* last = next ? LineAt(lines, size - 1) : nullptr;
+    if (!last) return nullptr;
+    const char* at = SkipLines(data + stopOffset, end, FirstLineOf(next) + edit.Delta() - stop,
                                &passed);
-    byteDelta = (at - data) - next->fOffset;
-    const LogicalLine* last = LineAt(lines, PyList_GET_SIZE(lines) - 1);
-    if (last->fOffset + byteDelta >= end - data) {  // the lines run past the new text
+    byteDelta = (at - data) - OffsetOf(next);
+    if (OffsetOf(last) + byteDelta >= end - data) {  // the lines run past the new text
       RefuseLines();
       return nullptr;
     }
   }
+  const Py_ssize_t count = PyList_GET_SIZE(added.Get());
   PyRef result = PyRef::Steal(Py_BuildValue("nnO", index, kept - index, added.Get()));
   if (!result) return nullptr;
-  // The later lines move before the list changes, and back if it cannot: the old lines that the
-  // list releases may run a host's code, which must find the list whole.
-  MoveLines(lines, kept, edit.Delta(), byteDelta);
-  if (PyList_SetSlice(lines, index, kept, added.Get()) != 0) {
-    MoveLines(lines, kept, -edit.Delta(), -byteDelta);
-    return nullptr;
+  if (ReserveGroups(table, ReservedGroups(count)) != 0) return PyErr_NoMemory();
+  // The old lines stay alive until the list is renumbered: releasing them may run a host's
+  // code, which must find the list whole.
+  PyRef removed = PyRef::Steal(PyList_GetSlice(lines, index, kept));
+  if (!removed || PyList_SetSlice(lines, index, kept, added.Get()) != 0) return nullptr;
+  for (Py_ssize_t i = 0; i < kept - index; i++) {
+    if (LogicalLine* line = LineIfOurs(removed.Get(), i)) DetachLine(line);
   }
+  Renumber(lines, table, index, count, edit.Delta(), byteDelta);
+  table->fList = lines;
+  table->fListLength = static_cast<size_t>(PyList_GET_SIZE(lines));
   return result.Release();
+}
+
+// Updates `lines` for the edit, from the new text [data, end). Returns the result, or nullptr
+// with an exception set and `lines` unchanged.
+PyObject* Update(PyObject* parser, PyObject* lines, const Edit& edit, const char* data,
+                 const char* end) {
+  ShiftTable* table = TableFor(lines);
+  if (!table) return nullptr;
+  PyObject* result = UpdateNumbered(parser, lines, table, edit, data, end);
+  DropShiftTable(table);
+  return result;
 }
 
 PyDoc_STRVAR(kUpdateLogicalLineListDoc,

@@ -1,0 +1,54 @@
+// The shared numbering table of an updated list.
+#include "lines/shift_table.h"
+
+#include <cstdlib>
+#include <cstring>
+
+#include "core/growth.h"
+
+ShiftTable* NewShiftTable() {
+  auto* table = static_cast<ShiftTable*>(malloc(sizeof(ShiftTable)));
+  if (!table) return nullptr;
+  *table = ShiftTable{.fRefs = 1, .fGroups = nullptr, .fOrder = nullptr, .fCount = 0,
+                      .fCapacity = 0, .fList = nullptr, .fListLength = 0};
+  return table;
+}
+
+void HoldShiftTable(ShiftTable* table) { table->fRefs++; }
+
+void DropShiftTable(ShiftTable* table) {
+  if (--table->fRefs > 0) return;
+  free(table->fGroups);
+  free(table->fOrder);
+  free(table);
+}
+
+int ReserveGroups(ShiftTable* table, size_t more) {
+  const size_t needed = table->fCount + more;
+  if (needed > UINT32_MAX) return -1;
+  size_t orderCapacity = table->fCapacity;
+  // The order first: if the groups cannot grow, the capacity still holds for both.
+  if (Grow(&table->fOrder, &orderCapacity, needed, 16) != 0) return -1;
+  return Grow(&table->fGroups, &table->fCapacity, needed, 16);
+}
+
+uint32_t InsertGroup(ShiftTable* table, size_t position) {
+  const auto id = static_cast<uint32_t>(table->fCount);
+  uint32_t* order = table->fOrder;
+  memmove(order + position + 1, order + position, (table->fCount - position) * sizeof(*order));
+  order[position] = id;
+  table->fCount++;
+  table->fGroups[id] = ShiftGroup{.fLineShift = 0, .fByteShift = 0, .fMembers = 0,
+                                  .fPosition = static_cast<uint32_t>(position)};
+  for (size_t i = position + 1; i < table->fCount; i++)
+    table->fGroups[order[i]].fPosition = static_cast<uint32_t>(i);
+  return id;
+}
+
+void ShiftGroupsFrom(ShiftTable* table, size_t position, int64_t lines, int64_t bytes) {
+  for (size_t i = position; i < table->fCount; i++) {
+    ShiftGroup& group = table->fGroups[table->fOrder[i]];
+    group.fLineShift += lines;
+    group.fByteShift += bytes;
+  }
+}

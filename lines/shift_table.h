@@ -1,0 +1,47 @@
+// The numbering of a list of lines that updates keep current. An edit moves every line after
+// it. Rather than touch each of those lines, the lines of an updated list sit in groups of
+// neighbours, all sharing one table: a line stores its first line and offset as they were when
+// it joined its group, and the table stores how far each group has moved since. Moving the
+// lines after an edit is then one pass over the groups that follow it, in one small array.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+struct ShiftGroup {
+  int64_t fLineShift;  // added to the first line that each member stores
+  int64_t fByteShift;  // added to the offset that each member stores
+  uint32_t fMembers;   // lines attached to the group; it stays in the order when empty
+  uint32_t fPosition;  // where the group stands in fOrder
+};
+
+struct ShiftTable {
+  size_t fRefs;         // attached lines, plus holds by an update under way
+  ShiftGroup* fGroups;  // by group id
+  uint32_t* fOrder;     // group ids, in the order of their lines in the list
+  size_t fCount;        // groups made; ids run from 0 to fCount - 1
+  size_t fCapacity;     // of fGroups and fOrder alike
+  // The list it numbers, and that list's length after its last update: compared only, to
+  // tell whether the list is still as the updates left it.
+  const void* fList;
+  size_t fListLength;
+};
+
+// A new empty table with one hold, or nullptr when memory is short (no exception set).
+ShiftTable* NewShiftTable();
+
+void HoldShiftTable(ShiftTable* table);
+
+// Drops a hold, freeing the table with the last.
+void DropShiftTable(ShiftTable* table);
+
+// Makes room for `more` groups, so that InsertGroup cannot fail. Returns 0, or -1 when memory
+// is short (no exception set).
+int ReserveGroups(ShiftTable* table, size_t more);
+
+// Makes a group with no shift, placed at `position` in the order, and returns its id. Room
+// must have been reserved.
+uint32_t InsertGroup(ShiftTable* table, size_t position);
+
+// Moves every group from `position` in the order on.
+void ShiftGroupsFrom(ShiftTable* table, size_t position, int64_t lines, int64_t bytes);
