@@ -2,8 +2,8 @@
 
 Input layout: byte 0 the parser options, then the text and a program of edits after a 0xFF
 0xFE separator (a seed is an option byte and a source file). Each edit is three program bytes:
-where it starts, how many lines it removes, and how many lines it inserts, which are taken from
-the text itself. After every edit the list must be what a full read of the new text gives, and
+where it starts, how many lines it removes, and how many lines it inserts (a few, or 40 to 229
+for a byte from 0xC0 on), which are taken from the text itself. After every edit the list must be what a full read of the new text gives, and
 every line outside the replaced slice must be the same object as before.
 
 Failures: a difference, an unexpected exception, or a sanitizer report.
@@ -42,6 +42,11 @@ def Read(parser, doc):
         return None
 
 
+def Count(byte):
+    """Mostly a few lines; now and then a paste or a cut big enough to split groups of lines."""
+    return byte % 4 if byte < 0xC0 else 40 + byte % 64 * 3
+
+
 def TestOneInput(data):
     if len(data) < 2:
         return
@@ -54,8 +59,8 @@ def TestOneInput(data):
         return
     for at in range(0, len(program) - 2, 3):
         first = program[at] % (len(doc) + 1)
-        old_count = program[at + 1] % 4 % (len(doc) - first + 1)
-        new = [pool[(program[at + 2] + k) % len(pool)] for k in range(program[at + 2] % 4)]
+        old_count = Count(program[at + 1]) % (len(doc) - first + 1)
+        new = [pool[(program[at + 2] + k) % len(pool)] for k in range(Count(program[at + 2]))]
         edited = doc[:first] + new + doc[first + old_count:]
         edited = [line if line.endswith(b"\n") or i == len(edited) - 1 else line + b"\n"
                   for i, line in enumerate(edited)]

@@ -88,6 +88,11 @@ def test_refusals_leave_the_list_alone(args, error):
     assert lines == before and [line.fFirstLine for line in lines] == [0, 1]
     for bad in (tuple(lines), lines + ["x"]):
         pytest.raises(TypeError, PARSER.UpdateLogicalLineList, bad, b"x = 1\ny = 2\n", 0, 0, 0)
+    PARSER.UpdateLogicalLineList(lines := PARSER.GetLogicalLineListFromBuffer(b"x\n" * 99),
+                                 b"x\n" * 99, 90, 1, 1)
+    # Changed since the last update, away from where the next one looks: a copy, then the list.
+    for bad in (lines[:10] + ["x"] + lines[11:], lines.insert(10, "x") or lines):
+        pytest.raises(TypeError, PARSER.UpdateLogicalLineList, bad, b"x\n" * 99, 90, 1, 1)
 
 
 def test_finalizers_run_by_an_update():  # set off by its allocations, or by the lines it drops
