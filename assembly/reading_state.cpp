@@ -24,6 +24,7 @@ int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* 
   state->fLineNumber = firstLine;
   state->fAtEnd = 0;
   state->fAtStart = 1;
+  state->fMayHoldNul = 1;
   state->fSourceOffset = 0;
   state->fPendingOffset = 0;
   state->fLineOffset = 0;

@@ -27,6 +27,7 @@ struct ReadingState {
   int64_t fLineNumber;   // number of the next physical line to read
   int fAtEnd;            // 1 once readline returned b""
   int fAtStart;          // 1 until the first physical line is read: it may open with a mark
+  int fMayHoldNul;       // 0 once the whole source is known to hold no NUL byte
   int64_t fSourceOffset;   // bytes the source has handed out so far
   int64_t fPendingOffset;  // where the pending line starts in the source
   int64_t fLineOffset;     // where the physical line read last starts in the source

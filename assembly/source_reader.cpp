@@ -77,7 +77,7 @@ int ReadSourceLine(ReadingState* state) {
   }
   state->fAtEnd = size == 0;
   if (size == 0) return 0;
-  if (memchr(bytes, '\0', static_cast<size_t>(size))) {
+  if (state->fMayHoldNul && memchr(bytes, '\0', static_cast<size_t>(size))) {
     PyErr_Format(PyExc_ValueError, "Binary data encountered at lineno %lld while tokenizing",
                  static_cast<long long>(state->fLineNumber));
     return -1;

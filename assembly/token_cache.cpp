@@ -56,10 +56,13 @@ void ClearTokenCache(TokenCache* cache) {
 
 PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n) {
   if (n > kCachedTextLimit || n <= 1) return PyBytes_FromStringAndSize(p, n);
-  const uint32_t hash = HashText(p, n);
+  const uint64_t head = WordAt(p, n);
+  const uint64_t tail = n > 8 ? WordAt(p + n - 8, 8) : 0;
+  const uint32_t hash = HashWords(head, tail, n);
   CacheSlot& slot = cache->fSlots[hash & (cache->fSlotCount - 1)];
-  if (slot.fBytes && slot.fHash == hash && PyBytes_GET_SIZE(slot.fBytes) == n &&
-      memcmp(PyBytes_AS_STRING(slot.fBytes), p, static_cast<size_t>(n)) == 0) {
+  if (slot.fBytes && slot.fHead == head && slot.fTail == tail && slot.fLength == n &&
+      (n <= 16 || memcmp(PyBytes_AS_STRING(slot.fBytes) + 8, p + 8,
+                         static_cast<size_t>(n - 16)) == 0)) {
     Py_INCREF(slot.fBytes);
     return slot.fBytes;
   }
@@ -68,7 +71,8 @@ PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n) {
   Py_INCREF(bytes);
   if (!slot.fBytes) cache->fFilled++;
   PyObject* old = slot.fBytes;
-  slot = CacheSlot{.fBytes = bytes, .fHash = hash};
+  slot = CacheSlot{.fBytes = bytes, .fHead = head, .fTail = tail, .fHash = hash,
+                   .fLength = static_cast<uint32_t>(n)};
   Py_XDECREF(old);
   GrowCache(cache);
   return bytes;

@@ -13,9 +13,14 @@
 constexpr Py_ssize_t kCachedTextLimit = 40;  // longer texts are rarely repeated
 constexpr size_t kInlineCacheSlots = 256;   // what a short source needs; a power of two
 
+// A text is known by its first eight bytes and its last eight (zero-padded words), and its
+// length: that is the whole text up to 16 bytes, and the rest is compared only beyond that.
 struct CacheSlot {
   PyObject* fBytes;  // owned, or null
-  uint32_t fHash;    // of fBytes's text, checked before the text
+  uint64_t fHead;
+  uint64_t fTail;
+  uint32_t fHash;    // of the head, the tail and the length
+  uint32_t fLength;
 };
 
 // Direct-mapped: a miss replaces the slot. It starts small, so that a short source costs
@@ -33,7 +38,8 @@ void InitTokenCache(TokenCache* cache);
 // Releases every object that the cache holds, and its storage; the cache is not used again.
 void ClearTokenCache(TokenCache* cache);
 
-// Returns a new reference to a bytes object holding the n bytes at p.
+// Returns a new reference to a bytes object holding the n bytes at p, which lie in a text with
+// the padding of a TextBuffer after it.
 PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n);
 
 // Returns a new reference to the fixed text stored for a token id, or nullptr if none is.

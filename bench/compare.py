@@ -174,7 +174,7 @@ def run_comparison(corpus, runs, slow_runs):
     progress("measured tokenize memory")
     print_memory(corpus, measures, tokenize_traced, tokenize_tokens)
     default = measures[0]
-    memory_per_token = (default["traced_tokens"] + default["native"]) / default["tokens"]
+    memory_per_token = default["traced_tokens"] / default["tokens"]
 
     print("\n== Editor updates (logicalline default options) ==")
     update_ratio = run_updates(parser, corpus, slow_runs)

@@ -15,28 +15,6 @@ def resident_bytes():
         return int(f.read().split()[1]) * os.sysconf("SC_PAGE_SIZE")
 
 
-def malloc_chunk(size):
-    # glibc on 64-bit: 8 bytes of header, 16-byte granules, 32 bytes at least.
-    return max(32, (size + 8 + 15) & ~15)
-
-
-def native_bytes(all_lines):
-    """What the lines hold through malloc, which tracemalloc does not see: the token array,
-    the positions and the line text of each line."""
-    total = 0
-    for lines in all_lines:
-        for line in lines:
-            n = max(line.fTokenCount, 1)
-            total += malloc_chunk(8 * n) + malloc_chunk(4 * n)
-            try:
-                text = line.fLineText
-            except UnicodeDecodeError:  # a file in another encoding: count its token texts
-                text = "".join(token for token, _ in line.fTokens)
-            if text is not None:
-                total += malloc_chunk(len(text.encode("utf-8", "surrogatepass")) + 1)
-    return total
-
-
 def parse_corpus(parser, sources):
     lines = []
     for data in sources:
@@ -83,13 +61,12 @@ def measure_memory(corpus, parser, label, check_rss):
     gc.collect()
     traced_tokens = tracemalloc.get_traced_memory()[0] - base
     tracemalloc.stop()
-    native = native_bytes(held)
     tokens = sum(line.fTokenCount for lines in held for line in lines)
     line_count = sum(map(len, held))
     del held
     gc.collect()
     return {
-        "label": label, "tokens": tokens, "lines": line_count, "native": native,
+        "label": label, "tokens": tokens, "lines": line_count,
         "traced_parsed": traced_parsed, "traced_tokens": traced_tokens, "rss_parsed": rss_parsed,
     }
 
@@ -109,9 +86,9 @@ def measure_tokenize_memory(corpus):
 
 
 def print_memory(corpus, measures, tokenize_traced, tokenize_tokens):
-    print("tracemalloc sees Python objects only; the lines' malloc'd arrays and texts are "
-          "added from their sizes (glibc chunk rounding). The RSS growth of a first, untraced "
-          "build is a cross-check.")
+    print("tracemalloc sees everything the lines hold: their token arrays, positions and texts "
+          "come from the interpreter's allocator too. The RSS growth of a first, untraced build "
+          "is a cross-check.")
     print(f"{'what is held':<52} {'MB':>8} {'B/token':>8} {'B/src B':>8}")
     ll_tokens = measures[0]["tokens"]
 
@@ -120,13 +97,11 @@ def print_memory(corpus, measures, tokenize_traced, tokenize_tokens):
               f"{retained / corpus.size:>8.2f}")
 
     for m in measures:
-        row(f"{m['label']}, lines as parsed", m["traced_parsed"] + m["native"], m["tokens"])
-        row(f"{m['label']}, after every fTokens read", m["traced_tokens"] + m["native"],
-            m["tokens"])
+        row(f"{m['label']}, lines as parsed", m["traced_parsed"], m["tokens"])
+        row(f"{m['label']}, after every fTokens read", m["traced_tokens"], m["tokens"])
         rss = m["rss_parsed"]
         rss_text = f"; RSS growth as parsed {rss / m['tokens']:.1f} B/token" if rss else ""
-        print(f"    ({m['lines']:,} lines, {m['tokens']:,} tokens; native part "
-              f"{m['native'] / m['tokens']:.1f} B/token{rss_text})")
+        print(f"    ({m['lines']:,} lines, {m['tokens']:,} tokens{rss_text})")
     row("tokenize, TokenInfo lists", tokenize_traced, tokenize_tokens)
     print(f"    ({tokenize_tokens:,} TokenInfo, counting NEWLINE, NL, INDENT, DEDENT, ENCODING "
           f"and ENDMARKER; {tokenize_traced / ll_tokens:.1f} B per logicalline token)")

@@ -7,8 +7,14 @@
 
 #include "core/growth.h"
 
+namespace {
+
+void Terminate(TextBuffer* buffer) { memset(buffer->fData + buffer->fLength, 0, kTextPadding); }
+
+}  // namespace
+
 void InitTextBuffer(TextBuffer* buffer) {
-  buffer->fInline[0] = '\0';
+  memset(buffer->fInline, 0, kTextPadding);
   buffer->fData = buffer->fInline;
   buffer->fCapacity = kInlineTextSize;
   buffer->fLength = 0;
@@ -21,18 +27,18 @@ void ResetTextBuffer(TextBuffer* buffer) {
 
 int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n) {
   if (n == 0) return 0;
-  const size_t needed = buffer->fLength + n + 1;  // the terminating NUL included
+  const size_t needed = buffer->fLength + n + kTextPadding;
   if (Grow(&buffer->fData, &buffer->fCapacity, needed, kInlineTextSize, buffer->fInline) != 0)
     return -1;
   memcpy(buffer->fData + buffer->fLength, bytes, n);
   buffer->fLength += n;
-  buffer->fData[buffer->fLength] = '\0';
+  Terminate(buffer);
   return 0;
 }
 
 void TruncateText(TextBuffer* buffer, size_t length) {
   if (length < buffer->fLength) {
     buffer->fLength = length;
-    buffer->fData[length] = '\0';
+    Terminate(buffer);
   }
 }

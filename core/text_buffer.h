@@ -5,12 +5,15 @@
 #include <cstddef>
 
 constexpr size_t kInlineTextSize = 160;
+// Zero bytes kept after the text, its terminating NUL first: a scanner may load a whole
+// 8-byte word at any offset of the text without reading past the storage.
+constexpr size_t kTextPadding = 8;
 
 struct TextBuffer {
   char fInline[kInlineTextSize];
   char* fData;       // fInline, or a heap block owned by the buffer
   size_t fCapacity;  // bytes of storage, terminating NUL included
-  size_t fLength;    // text bytes held; fData[fLength] is always NUL
+  size_t fLength;    // text bytes held; fData[fLength] and the padding after it are zero
 };
 
 // Puts the buffer into the fresh state without freeing anything.

@@ -51,7 +51,8 @@ int FillStorage(LogicalLine* line, const LineParts& parts) {
   const size_t tokenBytes = count * sizeof(PyObject*);
   const size_t positionBytes = count * sizeof(TokenPosition);
   const size_t textBytes = parts.fLineText ? parts.fLineTextLength + 1 : 0;
-  char* block = static_cast<char*>(malloc(tokenBytes + positionBytes + textBytes + 1));
+  // The interpreter's allocator: most blocks are small, which it serves faster than malloc.
+  char* block = static_cast<char*>(PyMem_Malloc(tokenBytes + positionBytes + textBytes + 1));
   if (!block) {
     PyErr_NoMemory();
     return -1;

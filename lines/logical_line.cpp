@@ -38,7 +38,7 @@ void LineDealloc(PyObject* self) {
   LogicalLine* line = AsLine(self);
   // The positions and the line text live in the token array's block.
   for (int i = 0; i < line->fTokenCount; i++) Py_DECREF(line->fTokenArray[i]);
-  free(line->fTokenArray);
+  PyMem_Free(line->fTokenArray);
   DetachLine(line);
   ClearAppended(line);
   Py_XDECREF(line->fScopeName);

@@ -7,6 +7,7 @@
 #include "module/reading_loop.h"
 
 #include <cstdint>
+#include <cstring>
 
 #include "assembly/line_builder.h"
 #include "assembly/reading_state.h"
@@ -44,6 +45,9 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
   if (InitReadingState(&state, ParserOptions(self), readline,
                        data, dataEnd, firstLine) != 0)
     return nullptr;
+  // A whole buffer without a NUL byte, the usual case, needs no search of every line for one.
+  if (!readline)
+    state.fMayHoldNul = memchr(data, '\0', static_cast<size_t>(dataEnd - data)) != nullptr;
   // Counted in 64 bits, so that no sum of the two arguments wraps; -1 means no stop line.
   const int64_t stop = lineCount == -1 ? -1 : static_cast<int64_t>(firstLine) + lineCount;
   const int status = ReadLines(&state, stop, list.Get());

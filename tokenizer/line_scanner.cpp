@@ -2,10 +2,13 @@
 // line text, which holds every physical line of the logical line in one buffer.
 #include "tokenizer/line_scanner.h"
 
+#include <bit>
+#include <cstdint>
 #include <cstring>
 
 #include "core/token_ids.h"
 #include "tokenizer/code_units.h"
+#include "tokenizer/token_text.h"
 
 namespace {
 
@@ -22,6 +25,16 @@ int BackslashRun(const char* from, const char* before) {
     count++;
   }
   return count;
+}
+
+// Steps over the spaces at p, a word at a time: indentation is most of the blanks in source.
+const char* SkipSpaces(const char* p, const char* end) {
+  while (end - p >= 8) {
+    const uint64_t others = WordAt(p, 8) ^ 0x2020202020202020ull;  // zero bytes were spaces
+    if (others) return p + std::countr_zero(others) / 8;
+    p += 8;
+  }
+  return p;
 }
 
 // Steps over a name: its first character, then every character that may continue it.
@@ -115,6 +128,7 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
     // The line begins inside an open string; fStart stays on the line where it began.
     pos = ScanStringBody(state, cursor, pos);
   } else {
+    pos = SkipSpaces(pos, end);
     while (pos < end && IsBlank(Byte(pos))) pos++;
     if (pos == end) {
       cursor->fPos = end;

@@ -5,6 +5,7 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
+#include <bit>
 #include <cstdint>
 #include <cstring>
 #include <string_view>
@@ -39,14 +40,34 @@ inline int BracketStep(unsigned first) {
   return 0;
 }
 
-// Mixes the first and last eight bytes and the length: enough to spread token texts over the
-// slots of a cache, at a fixed cost whatever the length.
-inline uint32_t HashText(const char* p, Py_ssize_t n) {
-  uint64_t head = 0;
-  uint64_t tail = 0;
-  memcpy(&head, p, static_cast<size_t>(n < 8 ? n : 8));
-  if (n > 8) memcpy(&tail, p + n - 8, 8);
+static_assert(std::endian::native == std::endian::little, "words are read little-endian");
+
+// The n bytes at p (at most 8) as a word, the first in the low byte, zero above them. Eight
+// bytes must be readable at p.
+inline uint64_t WordAt(const char* p, Py_ssize_t n) {
+  uint64_t word = 0;
+  memcpy(&word, p, sizeof(word));
+  return n >= 8 ? word : word & ((uint64_t{1} << (8 * n)) - 1);
+}
+
+// The first eight bytes of the n at p, or all of them when fewer, as WordAt gives them; read
+// a byte at a time when fewer, for a text with nothing readable after it.
+inline uint64_t HeadWord(const char* p, Py_ssize_t n) {
+  if (n >= 8) return WordAt(p, 8);
+  uint64_t word = 0;
+  for (Py_ssize_t i = n - 1; i >= 0; i--) word = word << 8 | static_cast<unsigned char>(p[i]);
+  return word;
+}
+
+// Mixes the first and last eight bytes (words as WordAt gives them; the last is 0 for a text of
+// eight bytes or fewer) and the length: enough to spread token texts over the slots of a cache,
+// at a fixed cost whatever the length.
+inline uint32_t HashWords(uint64_t head, uint64_t tail, Py_ssize_t n) {
   const uint64_t mixed = (head ^ (tail * 0x9E3779B97F4A7C15ull) ^ static_cast<uint64_t>(n)) *
                          0xFF51AFD7ED558CCDull;
   return static_cast<uint32_t>(mixed >> 32);
+}
+
+inline uint32_t HashText(const char* p, Py_ssize_t n) {
+  return HashWords(HeadWord(p, n), n > 8 ? WordAt(p + n - 8, 8) : 0, n);
 }
