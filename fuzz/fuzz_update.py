@@ -2,9 +2,10 @@
 
 Input layout: byte 0 the parser options, then the text and a program of edits after a 0xFF
 0xFE separator (a seed is an option byte and a source file). Each edit is three program bytes:
-where it starts, how many lines it removes, and how many lines it inserts (a few, or 40 to 229
-for a byte from 0xC0 on), which are taken from the text itself. After every edit the list must be what a full read of the new text gives, and
-every line outside the replaced slice must be the same object as before.
+where it starts, how many lines it removes, and how many lines it inserts (a few, or 33 to 64
+for a byte from 0xC0 on while the text is under 600 lines), which are taken from the text
+itself. After every edit the list must be what a full read of the new text gives, and every
+line outside the replaced slice must be the same object as before.
 
 Failures: a difference, an unexpected exception, or a sanitizer report.
 """
@@ -44,7 +45,7 @@ def Read(parser, doc):
 
 def Count(byte):
     """Mostly a few lines; now and then a paste or a cut big enough to split groups of lines."""
-    return byte % 4 if byte < 0xC0 else 40 + byte % 64 * 3
+    return byte % 4 if byte < 0xC0 else 33 + byte % 32
 
 
 def TestOneInput(data):
@@ -60,7 +61,8 @@ def TestOneInput(data):
     for at in range(0, len(program) - 2, 3):
         first = program[at] % (len(doc) + 1)
         old_count = Count(program[at + 1]) % (len(doc) - first + 1)
-        new = [pool[(program[at + 2] + k) % len(pool)] for k in range(Count(program[at + 2]))]
+        count = Count(program[at + 2]) if len(doc) < 600 else program[at + 2] % 4
+        new = [pool[(program[at + 2] + k) % len(pool)] for k in range(count)]
         edited = doc[:first] + new + doc[first + old_count:]
         edited = [line if line.endswith(b"\n") or i == len(edited) - 1 else line + b"\n"
                   for i, line in enumerate(edited)]
