@@ -47,16 +47,39 @@ PyObject* NewPair(PyObject* first, PyObject* second) {
   return pair;
 }
 
-PyObject* NewPosition(TokenPosition position) {
-  PyRef row = PyRef::Steal(PyLong_FromLong(position.fLine));
-  if (!row) return nullptr;
-  PyRef column = PyRef::Steal(PyLong_FromLong(position.fColumn));
-  if (!column) return nullptr;
-  return NewPair(row.Get(), column.Get());
-}
-
 bool IsSharedPosition(TokenPosition position) {
   return position.fLine < kSharedLines && position.fColumn < kSharedColumns;
+}
+
+// The line index of the positions made last, kept while one line's tokens are listed: past
+// the shared positions, the tokens of one physical line share its index.
+struct RowInt {
+  int fIndex = -1;
+  PyRef fInt;
+};
+
+PyObject* NewPosition(TokenPosition position, RowInt* last) {
+  if (last->fIndex != position.fLine) {
+    last->fInt = PyRef::Steal(PyLong_FromLong(position.fLine));
+    last->fIndex = last->fInt ? position.fLine : -1;
+    if (!last->fInt) return nullptr;
+  }
+  PyRef column = PyRef::Steal(PyLong_FromLong(position.fColumn));
+  if (!column) return nullptr;
+  return NewPair(last->fInt.Get(), column.Get());
+}
+
+// Returns a new reference to the tuple (line index, column), shared when it can be.
+PyObject* PositionOf(TokenPosition position, RowInt* last) {
+  if (!IsSharedPosition(position)) return NewPosition(position, last);
+  PyObject*& shared = gPositions[position.fLine][position.fColumn];
+  if (!shared) {
+    RowInt own;
+    shared = NewPosition(position, &own);
+    if (!shared) return nullptr;
+  }
+  Py_INCREF(shared);
+  return shared;
 }
 
 bool IsSharedText(PyObject* token) { return PyBytes_GET_SIZE(token) <= kSharedTextLimit; }
@@ -105,8 +128,12 @@ PyObject* EntryOf(PyObject* text, PyObject* position, bool shared) {
 PyObject* BuildTokensTuple(LogicalLine* line) {
   PyRef tuple = PyRef::Steal(PyTuple_New(line->fTokenCount));
   if (!tuple) return nullptr;
+  // Out of the collector's sight from the start: the entries' allocations set off collections,
+  // which would otherwise walk the whole tuple, again and again for a long line.
+  if (line->fTokenCount > 0) PyObject_GC_UnTrack(tuple.Get());
+  RowInt row;
   for (int i = 0; i < line->fTokenCount; i++) {
-    PyRef position = PyRef::Steal(PositionTuple(line->fTokenPositions[i]));
+    PyRef position = PyRef::Steal(PositionOf(line->fTokenPositions[i], &row));
     if (!position) return nullptr;
     PyRef text = PyRef::Steal(TextOf(line->fTokenArray[i]));
     if (!text) return nullptr;
@@ -116,21 +143,14 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
     if (!entry) return nullptr;
     PyTuple_SET_ITEM(tuple.Get(), i, entry);
   }
-  if (line->fTokenCount > 0) PyObject_GC_UnTrack(tuple.Get());
   return tuple.Release();
 }
 
 }  // namespace
 
 PyObject* PositionTuple(TokenPosition position) {
-  if (!IsSharedPosition(position)) return NewPosition(position);
-  PyObject*& shared = gPositions[position.fLine][position.fColumn];
-  if (!shared) {
-    shared = NewPosition(position);
-    if (!shared) return nullptr;
-  }
-  Py_INCREF(shared);
-  return shared;
+  RowInt row;
+  return PositionOf(position, &row);
 }
 
 PyObject* LineTokens(LogicalLine* line) {
