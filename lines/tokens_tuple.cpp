@@ -51,31 +51,30 @@ bool IsSharedPosition(TokenPosition position) {
   return position.fLine < kSharedLines && position.fColumn < kSharedColumns;
 }
 
-// The line index of the positions made last, kept while one line's tokens are listed: past
-// the shared positions, the tokens of one physical line share its index.
-struct RowInt {
-  int fIndex = -1;
-  PyRef fInt;
-};
+// Line indexes and columns are kept modulo 65536, so every int that a position can hold has a
+// place here: past the small ints that the interpreter shares itself, a long line or a long
+// logical line would otherwise make one for nearly every token.
+PyObject* gPositionInts[1 << 16];  // owned, made at first use
 
-PyObject* NewPosition(TokenPosition position, RowInt* last) {
-  if (last->fIndex != position.fLine) {
-    last->fInt = PyRef::Steal(PyLong_FromLong(position.fLine));
-    last->fIndex = last->fInt ? position.fLine : -1;
-    if (!last->fInt) return nullptr;
-  }
-  PyRef column = PyRef::Steal(PyLong_FromLong(position.fColumn));
-  if (!column) return nullptr;
-  return NewPair(last->fInt.Get(), column.Get());
+// Returns a borrowed reference to the int of a position part, or nullptr with an exception.
+PyObject* PositionInt(uint16_t value) {
+  PyObject*& known = gPositionInts[value];
+  if (!known) known = PyLong_FromLong(value);
+  return known;
+}
+
+PyObject* NewPosition(TokenPosition position) {
+  PyObject* row = PositionInt(position.fLine);
+  PyObject* column = row ? PositionInt(position.fColumn) : nullptr;
+  return column ? NewPair(row, column) : nullptr;
 }
 
 // Returns a new reference to the tuple (line index, column), shared when it can be.
-PyObject* PositionOf(TokenPosition position, RowInt* last) {
-  if (!IsSharedPosition(position)) return NewPosition(position, last);
+PyObject* PositionOf(TokenPosition position) {
+  if (!IsSharedPosition(position)) return NewPosition(position);
   PyObject*& shared = gPositions[position.fLine][position.fColumn];
   if (!shared) {
-    RowInt own;
-    shared = NewPosition(position, &own);
+    shared = NewPosition(position);
     if (!shared) return nullptr;
   }
   Py_INCREF(shared);
@@ -131,9 +130,8 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
   // Out of the collector's sight from the start: the entries' allocations set off collections,
   // which would otherwise walk the whole tuple, again and again for a long line.
   if (line->fTokenCount > 0) PyObject_GC_UnTrack(tuple.Get());
-  RowInt row;
   for (int i = 0; i < line->fTokenCount; i++) {
-    PyRef position = PyRef::Steal(PositionOf(line->fTokenPositions[i], &row));
+    PyRef position = PyRef::Steal(PositionOf(line->fTokenPositions[i]));
     if (!position) return nullptr;
     PyRef text = PyRef::Steal(TextOf(line->fTokenArray[i]));
     if (!text) return nullptr;
@@ -148,10 +146,7 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
 
 }  // namespace
 
-PyObject* PositionTuple(TokenPosition position) {
-  RowInt row;
-  return PositionOf(position, &row);
-}
+PyObject* PositionTuple(TokenPosition position) { return PositionOf(position); }
 
 PyObject* LineTokens(LogicalLine* line) {
   if (!line->fTokensTuple) {
