@@ -69,35 +69,45 @@ PyObject* NewPosition(TokenPosition position) {
   return column ? NewPair(row, column) : nullptr;
 }
 
+// Returns a borrowed reference to the shared tuple of a position (they live as long as the
+// process), or nullptr with an exception set.
+PyObject* SharedPosition(TokenPosition position) {
+  PyObject*& shared = gPositions[position.fLine][position.fColumn];
+  if (!shared) {
+    PyObject* made = NewPosition(position);  // may set off a collection, and a finalizer
+    if (!made) return nullptr;
+    if (shared) {  // that made the same position meanwhile
+      Py_DECREF(made);
+    } else {
+      shared = made;
+    }
+  }
+  return shared;
+}
+
 // Returns a new reference to the tuple (line index, column), shared when it can be.
 PyObject* PositionOf(TokenPosition position) {
   if (!IsSharedPosition(position)) return NewPosition(position);
-  PyObject*& shared = gPositions[position.fLine][position.fColumn];
-  if (!shared) {
-    shared = NewPosition(position);
-    if (!shared) return nullptr;
-  }
-  Py_INCREF(shared);
+  PyObject* shared = SharedPosition(position);
+  Py_XINCREF(shared);
   return shared;
 }
 
 bool IsSharedText(PyObject* token) { return PyBytes_GET_SIZE(token) <= kSharedTextLimit; }
 
-// Returns a new reference to the str shown for a token.
-PyObject* TextOf(PyObject* token) {
+// Returns a borrowed reference to the str shown for a short token, or nullptr with an
+// exception set. It stays in the table only until another text takes its slot, and making a
+// str sets off no collection, so it may be used until the next allocation of a tuple.
+PyObject* SharedText(PyObject* token) {
   const TokenText text(token);
-  if (!IsSharedText(token)) return TokenStr(token);
   TextSlot& slot = gTexts[HashText(text.fBytes, text.fLength) & (kTextSlots - 1)];
   if (slot.fToken && (slot.fToken == token || (PyBytes_GET_SIZE(slot.fToken) == text.fLength &&
                                                memcmp(PyBytes_AS_STRING(slot.fToken), text.fBytes,
-                                                      static_cast<size_t>(text.fLength)) == 0))) {
-    Py_INCREF(slot.fText);
+                                                      static_cast<size_t>(text.fLength)) == 0)))
     return slot.fText;
-  }
   PyObject* shown = TokenStr(token);
   if (!shown) return nullptr;
   Py_INCREF(token);
-  Py_INCREF(shown);
   PyObject* oldToken = slot.fToken;
   PyObject* oldText = slot.fText;
   slot = TextSlot{.fToken = token, .fText = shown};
@@ -106,9 +116,25 @@ PyObject* TextOf(PyObject* token) {
   return shown;
 }
 
-// Returns a new reference to the entry (text, position), shared when both parts are.
-PyObject* EntryOf(PyObject* text, PyObject* position, bool shared) {
-  if (!shared) return NewPair(text, position);
+// Returns a new reference to the str shown for a token.
+PyObject* TextOf(PyObject* token) {
+  if (!IsSharedText(token)) return TokenStr(token);
+  PyObject* shown = SharedText(token);
+  Py_XINCREF(shown);
+  return shown;
+}
+
+// Returns a new reference to the entry of a token at a position. When both parts are shared,
+// so is the entry, found by the two objects it holds: a hit touches neither of them.
+PyObject* TokenEntry(PyObject* token, TokenPosition at) {
+  if (!IsSharedText(token) || !IsSharedPosition(at)) {
+    PyRef position = PyRef::Steal(PositionOf(at));
+    PyRef text = PyRef::Steal(position ? TextOf(token) : nullptr);
+    return text ? NewPair(text.Get(), position.Get()) : nullptr;
+  }
+  PyObject* position = SharedPosition(at);
+  PyObject* text = position ? SharedText(token) : nullptr;
+  if (!text) return nullptr;
   const uintptr_t key = (reinterpret_cast<uintptr_t>(text) >> 4) * 31 +
                         (reinterpret_cast<uintptr_t>(position) >> 4);
   PyObject*& slot = gEntries[key & (kEntrySlots - 1)];
@@ -116,6 +142,7 @@ PyObject* EntryOf(PyObject* text, PyObject* position, bool shared) {
     Py_INCREF(slot);
     return slot;
   }
+  const PyRef held = PyRef::FromBorrowed(text);  // through the tuple's allocation
   PyObject* entry = NewPair(text, position);
   if (entry) {
     Py_INCREF(entry);
@@ -131,13 +158,7 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
   // which would otherwise walk the whole tuple, again and again for a long line.
   if (line->fTokenCount > 0) PyObject_GC_UnTrack(tuple.Get());
   for (int i = 0; i < line->fTokenCount; i++) {
-    PyRef position = PyRef::Steal(PositionOf(line->fTokenPositions[i]));
-    if (!position) return nullptr;
-    PyRef text = PyRef::Steal(TextOf(line->fTokenArray[i]));
-    if (!text) return nullptr;
-    const bool shared =
-        IsSharedText(line->fTokenArray[i]) && IsSharedPosition(line->fTokenPositions[i]);
-    PyObject* entry = EntryOf(text.Get(), position.Get(), shared);
+    PyObject* entry = TokenEntry(line->fTokenArray[i], line->fTokenPositions[i]);
     if (!entry) return nullptr;
     PyTuple_SET_ITEM(tuple.Get(), i, entry);
   }
@@ -150,8 +171,13 @@ PyObject* PositionTuple(TokenPosition position) { return PositionOf(position); }
 
 PyObject* LineTokens(LogicalLine* line) {
   if (!line->fTokensTuple) {
-    line->fTokensTuple = BuildTokensTuple(line);
-    if (!line->fTokensTuple) return nullptr;
+    PyObject* built = BuildTokensTuple(line);
+    if (!built) return nullptr;
+    if (line->fTokensTuple) {  // a finalizer that a collection ran read it meanwhile
+      Py_DECREF(built);
+    } else {
+      line->fTokensTuple = built;
+    }
   }
   Py_INCREF(line->fTokensTuple);
   return line->fTokensTuple;
