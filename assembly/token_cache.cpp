@@ -61,7 +61,7 @@ PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n) {
   const uint32_t hash = HashWords(head, tail, n);
   CacheSlot& slot = cache->fSlots[hash & (cache->fSlotCount - 1)];
   if (slot.fBytes && slot.fHead == head && slot.fTail == tail && slot.fLength == n &&
-      (n <= 16 || memcmp(PyBytes_AS_STRING(slot.fBytes) + 8, p + 8,
+      (n <= 16 || memcmp(TokenText(slot.fBytes).fBytes + 8, p + 8,
                          static_cast<size_t>(n - 16)) == 0)) {
     Py_INCREF(slot.fBytes);
     return slot.fBytes;
