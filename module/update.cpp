@@ -103,19 +103,11 @@ int RefuseLines() {
 
 // Builds a new table for the list, its lines in groups of kGroupLines, checking on the way that
 // they are our lines, in order, without overlaps. Returns the table, with the caller's hold,
-// or nullptr with an exception set and nothing changed.
+// or nullptr with an exception set. A line joins the new table as soon as it is checked, which
+// keeps its numbers: on a refusal the lines before stay in it, and the next update builds the
+// table again.
 ShiftTable* BuildTable(PyObject* lines) {
   const Py_ssize_t size = PyList_GET_SIZE(lines);
-  int64_t end = 0;
-  for (Py_ssize_t i = 0; i < size; i++) {
-    const LogicalLine* line = LineAt(lines, i);
-    if (!line) return nullptr;
-    if (FirstLineOf(line) < end || line->fLineCount < 1 || OffsetOf(line) < 0) {
-      RefuseLines();
-      return nullptr;
-    }
-    end = EndOf(line);
-  }
   ShiftTable* table = NewShiftTable();
   if (!table || ReserveGroups(table, (static_cast<size_t>(size) + kGroupLines - 1) /
                                          kGroupLines) != 0) {
@@ -123,10 +115,19 @@ ShiftTable* BuildTable(PyObject* lines) {
     PyErr_NoMemory();
     return nullptr;
   }
+  int64_t end = 0;
   uint32_t group = 0;
   for (Py_ssize_t i = 0; i < size; i++) {
+    LogicalLine* line = LineAt(lines, i);
+    const bool fits =
+        line && FirstLineOf(line) >= end && line->fLineCount >= 1 && OffsetOf(line) >= 0;
+    if (!fits) {
+      if (line) RefuseLines();
+      DropShiftTable(table);
+      return nullptr;
+    }
+    end = EndOf(line);
     if (static_cast<size_t>(i) % kGroupLines == 0) group = InsertGroup(table, table->fCount);
-    LogicalLine* line = AsLine(PyList_GET_ITEM(lines, i));
     DetachLine(line);
     AttachLine(line, table, group);
   }
