@@ -70,6 +70,8 @@ def test_positions_past_the_shared_ones():  # the first 16 lines and 256 columns
     source = b"x = (\n" + b"\n" * 14 + b" " * 255 + b"a,\n" + b" " * 256 + b"b)\n"
     assert read(source)[0].fTokens[-4:] == (
         ("a", (15, 255)), (",", (15, 256)), ("b", (16, 256)), (")", (16, 257)))
+    source = b"x" + b" " * 255 + b"= (\na)\n"  # column 256 of line 0 would be line 1's column 0
+    assert [p for _, p in read(source)[0].fTokens] == [(0, 0), (0, 256), (0, 258), (1, 0), (1, 1)]
 
 
 @pytest.mark.parametrize("source, indent, tabs, spaces", [
