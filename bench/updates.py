@@ -175,8 +175,8 @@ def run_one_line_edits(parser, sources):
         progress(f"updated {size:,} lines")
     print(f"(real code: files of the corpus that ast.parse accepts, joined and cut to size; the "
           f"last letter of a line at or just after the middle changed and changed back, "
-          f"{EDITS_PER_SIZE} updates; first: the first update of the list, which numbers "
-          f"every line once; mean: of every update, the first included; full read: the mean "
+          f"{EDITS_PER_SIZE} updates; first: the first update of the list, which finds "
+          f"its lines out of the cache; mean: of every update, the first included; full read: the mean "
           f"of {FULL_READS}; faster by: the mean "
           f"full read over the mean update; scan: data.count(b'\\n') over the whole new text, "
           f"what any pass over every byte costs)")

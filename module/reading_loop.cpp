@@ -13,12 +13,16 @@
 #include "assembly/reading_state.h"
 #include "core/py_ref.h"
 #include "lines/construction.h"
+#include "lines/logical_line.h"
+#include "lines/numbering.h"
+#include "lines/shift_table.h"
 #include "module/parser.h"
 
 namespace {
 
-// Reads logical lines into `list` until the stop line (-1: none). Returns 0, or -1.
-int ReadLines(ReadingState* state, int64_t stop, PyObject* list) {
+// Reads logical lines into `list` until the stop line (-1: none), numbering our lines with
+// `table` when there is one. Returns 0, or -1.
+int ReadLines(ReadingState* state, int64_t stop, PyObject* list, ShiftTable* table) {
   while (!(stop != -1 && state->fLineNumber >= stop) && !state->fAtEnd) {
     LineParts parts;
     const int built = BuildLogicalLine(state, &parts);
@@ -26,7 +30,11 @@ int ReadLines(ReadingState* state, int64_t stop, PyObject* list) {
     if (built == 0) continue;
     PyRef line = PyRef::Steal(CreateLogicalLine(parts));
     if (!line) return -1;
-    if (line.Get() != Py_None && PyList_Append(list, line.Get()) != 0) return -1;
+    if (line.Get() == Py_None) continue;
+    if (table && Py_TYPE(line.Get()) == &LogicalLineType &&
+        NumberLine(table, AsLine(line.Get()), static_cast<size_t>(PyList_GET_SIZE(list))) != 0)
+      return -1;
+    if (PyList_Append(list, line.Get()) != 0) return -1;
   }
   return 0;
 }
@@ -50,8 +58,22 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
     state.fMayHoldNul = memchr(data, '\0', static_cast<size_t>(dataEnd - data)) != nullptr;
   // Counted in 64 bits, so that no sum of the two arguments wraps; -1 means no stop line.
   const int64_t stop = lineCount == -1 ? -1 : static_cast<int64_t>(firstLine) + lineCount;
-  const int status = ReadLines(&state, stop, list.Get());
+  // A whole read is numbered as it is built, so that the first update of the list need not
+  // walk it; a window cannot be updated, and a hook's lines are not ours.
+  ShiftTable* table = nullptr;
+  if (firstLine == 0 && lineCount == -1 && !HasCreateHook()) {
+    table = NewShiftTable();
+    if (!table) {
+      ReleaseReadingState(&state);
+      return PyErr_NoMemory();
+    }
+  }
+  const int status = ReadLines(&state, stop, list.Get(), table);
   ReleaseReadingState(&state);
+  if (table) {
+    SealNumbering(table, list.Get(), static_cast<size_t>(PyList_GET_SIZE(list.Get())));
+    DropShiftTable(table);
+  }
   return status == 0 ? list.Release() : nullptr;
 }
 

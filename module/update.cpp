@@ -18,6 +18,7 @@
 #include "core/py_ref.h"
 #include "lines/construction.h"
 #include "lines/logical_line.h"
+#include "lines/numbering.h"
 #include "lines/shift_table.h"
 #include "module/parser.h"
 
@@ -32,10 +33,8 @@ struct Edit {
   int64_t Delta() const { return fNewCount - fOldCount; }
 };
 
-// A table is built with this many lines in each group, and the lines a re-read adds join the
-// group before them while it holds no more than the limit: an update moves the later members
-// of its own group one by one, and every later group as a whole.
-constexpr size_t kGroupLines = 32;
+// The lines a re-read adds join the group before them while it holds no more than this: an
+// update moves the later members of its own group one by one, and every later group as a whole.
 constexpr size_t kGroupLimit = 64;
 
 // Item i of the list as a line, or nullptr: the list must hold nothing but our lines.
@@ -101,23 +100,18 @@ int RefuseLines() {
   return -1;
 }
 
-// Builds a new table for the list, its lines in groups of kGroupLines, checking on the way that
-// they are our lines, in order, without overlaps. Returns the table, with the caller's hold,
-// or nullptr with an exception set. A line joins the new table as soon as it is checked, which
-// keeps its numbers: on a refusal the lines before stay in it, and the next update builds the
-// table again.
+// Builds a new table for the list, checking on the way that its items are our lines, in order,
+// without overlaps. Returns the table, with the caller's hold, or nullptr with an exception
+// set. A line joins the new table as soon as it is checked, which keeps its numbers: on a
+// refusal the lines before stay in it, and the next update builds the table again.
 ShiftTable* BuildTable(PyObject* lines) {
-  const Py_ssize_t size = PyList_GET_SIZE(lines);
   ShiftTable* table = NewShiftTable();
-  if (!table || ReserveGroups(table, (static_cast<size_t>(size) + kGroupLines - 1) /
-                                         kGroupLines) != 0) {
-    if (table) DropShiftTable(table);
+  if (!table) {
     PyErr_NoMemory();
     return nullptr;
   }
   int64_t end = 0;
-  uint32_t group = 0;
-  for (Py_ssize_t i = 0; i < size; i++) {
+  for (Py_ssize_t i = 0; i < PyList_GET_SIZE(lines); i++) {
     LogicalLine* line = LineAt(lines, i);
     const bool fits =
         line && FirstLineOf(line) >= end && line->fLineCount >= 1 && OffsetOf(line) >= 0;
@@ -127,9 +121,10 @@ ShiftTable* BuildTable(PyObject* lines) {
       return nullptr;
     }
     end = EndOf(line);
-    if (static_cast<size_t>(i) % kGroupLines == 0) group = InsertGroup(table, table->fCount);
-    DetachLine(line);
-    AttachLine(line, table, group);
+    if (NumberLine(table, line, static_cast<size_t>(i)) != 0) {
+      DropShiftTable(table);
+      return nullptr;
+    }
   }
   return table;
 }
@@ -344,8 +339,7 @@ PyObject* UpdateNumbered(PyObject* parser, PyObject* lines, ShiftTable* table, c
     if (LogicalLine* line = LineIfOurs(removed.Get(), i)) DetachLine(line);
   }
   Renumber(lines, table, index, count, edit.Delta(), byteDelta);
-  table->fList = lines;
-  table->fListLength = static_cast<size_t>(PyList_GET_SIZE(lines));
+  SealNumbering(table, lines, static_cast<size_t>(PyList_GET_SIZE(lines)));
   return result.Release();
 }
 
