@@ -85,14 +85,6 @@ PyObject* SharedPosition(TokenPosition position) {
   return shared;
 }
 
-// Returns a new reference to the tuple (line index, column), shared when it can be.
-PyObject* PositionOf(TokenPosition position) {
-  if (!IsSharedPosition(position)) return NewPosition(position);
-  PyObject* shared = SharedPosition(position);
-  Py_XINCREF(shared);
-  return shared;
-}
-
 bool IsSharedText(PyObject* token) { return PyBytes_GET_SIZE(token) <= kSharedTextLimit; }
 
 // Returns a borrowed reference to the str shown for a short token, or nullptr with an
@@ -128,7 +120,7 @@ PyObject* TextOf(PyObject* token) {
 // so is the entry, found by the two objects it holds: a hit touches neither of them.
 PyObject* TokenEntry(PyObject* token, TokenPosition at) {
   if (!IsSharedText(token) || !IsSharedPosition(at)) {
-    PyRef position = PyRef::Steal(PositionOf(at));
+    PyRef position = PyRef::Steal(PositionTuple(at));
     PyRef text = PyRef::Steal(position ? TextOf(token) : nullptr);
     return text ? NewPair(text.Get(), position.Get()) : nullptr;
   }
@@ -167,7 +159,12 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
 
 }  // namespace
 
-PyObject* PositionTuple(TokenPosition position) { return PositionOf(position); }
+PyObject* PositionTuple(TokenPosition position) {
+  if (!IsSharedPosition(position)) return NewPosition(position);
+  PyObject* shared = SharedPosition(position);
+  Py_XINCREF(shared);
+  return shared;
+}
 
 PyObject* LineTokens(LogicalLine* line) {
   if (!line->fTokensTuple) {

@@ -53,8 +53,9 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
   if (InitReadingState(&state, ParserOptions(self), readline,
                        data, dataEnd, firstLine) != 0)
     return nullptr;
-  // A whole buffer without a NUL byte, the usual case, needs no search of every line for one.
-  if (!readline)
+  // A whole buffer read to its end without a NUL byte, the usual case, needs no search of every
+  // line for one; a window that stops early is searched line by line, never past its end.
+  if (!readline && lineCount == -1)
     state.fMayHoldNul = memchr(data, '\0', static_cast<size_t>(dataEnd - data)) != nullptr;
   // Counted in 64 bits, so that no sum of the two arguments wraps; -1 means no stop line.
   const int64_t stop = lineCount == -1 ? -1 : static_cast<int64_t>(firstLine) + lineCount;
@@ -71,7 +72,8 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
   const int status = ReadLines(&state, stop, list.Get(), table);
   ReleaseReadingState(&state);
   if (table) {
-    SealNumbering(table, list.Get(), static_cast<size_t>(PyList_GET_SIZE(list.Get())));
+    if (status == 0)
+      SealNumbering(table, list.Get(), static_cast<size_t>(PyList_GET_SIZE(list.Get())));
     DropShiftTable(table);
   }
   return status == 0 ? list.Release() : nullptr;
