@@ -32,9 +32,26 @@ struct TextSlot {
 TextSlot gTexts[kTextSlots];
 
 // Whole entries, by the shared text and position they hold: the same token at the same place
-// recurs from line to line ("self" at column 8, "=" after a short name).
-constexpr uintptr_t kEntrySlots = 8192;  // a power of two
-PyObject* gEntries[kEntrySlots];  // owned (text, position) tuples, or null
+// recurs from line to line ("self" at column 8, "=" after a short name). Two ways to a set,
+// the one used last first: a pair of entries that take turns in one set would otherwise
+// replace each other on every use.
+constexpr uintptr_t kEntrySets = 8192;  // a power of two
+struct EntrySet {
+  PyObject* fWays[2];  // owned (text, position) tuples, or null
+};
+EntrySet gEntries[kEntrySets];
+
+// Objects sit at multiples of 16 bytes, a few size classes apart: multiplying spreads the
+// pair over every set, where a sum of the pointers would crowd a few.
+uintptr_t EntrySetOf(PyObject* text, PyObject* position) {
+  const uint64_t mixed = (reinterpret_cast<uint64_t>(text) * 0x9E3779B97F4A7C15ull) ^
+                         reinterpret_cast<uint64_t>(position);
+  return static_cast<uintptr_t>((mixed * 0xFF51AFD7ED558CCDull) >> 40) & (kEntrySets - 1);
+}
+
+bool EntryHolds(PyObject* entry, PyObject* text, PyObject* position) {
+  return entry && PyTuple_GET_ITEM(entry, 0) == text && PyTuple_GET_ITEM(entry, 1) == position;
+}
 
 PyObject* NewPair(PyObject* first, PyObject* second) {
   PyObject* pair = PyTuple_New(2);
@@ -127,19 +144,28 @@ PyObject* TokenEntry(PyObject* token, TokenPosition at) {
   PyObject* position = SharedPosition(at);
   PyObject* text = position ? SharedText(token) : nullptr;
   if (!text) return nullptr;
-  const uintptr_t key = (reinterpret_cast<uintptr_t>(text) >> 4) * 31 +
-                        (reinterpret_cast<uintptr_t>(position) >> 4);
-  PyObject*& slot = gEntries[key & (kEntrySlots - 1)];
-  if (slot && PyTuple_GET_ITEM(slot, 0) == text && PyTuple_GET_ITEM(slot, 1) == position) {
-    Py_INCREF(slot);
-    return slot;
+  EntrySet& set = gEntries[EntrySetOf(text, position)];
+  PyObject* first = set.fWays[0];
+  if (EntryHolds(first, text, position)) {
+    Py_INCREF(first);
+    return first;
+  }
+  PyObject* second = set.fWays[1];
+  if (EntryHolds(second, text, position)) {
+    set.fWays[1] = first;
+    set.fWays[0] = second;
+    Py_INCREF(second);
+    return second;
   }
   const PyRef held = PyRef::FromBorrowed(text);  // through the tuple's allocation
   PyObject* entry = NewPair(text, position);
-  if (entry) {
-    Py_INCREF(entry);
-    Py_XSETREF(slot, entry);
-  }
+  if (!entry) return nullptr;
+  // That allocation may have run a finalizer that filled the set: take it as it is now.
+  PyObject* dropped = set.fWays[1];
+  set.fWays[1] = set.fWays[0];
+  set.fWays[0] = entry;
+  Py_INCREF(entry);
+  Py_XDECREF(dropped);
   return entry;
 }
 
