@@ -46,8 +46,10 @@ void MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
   state->fIndent = static_cast<int>(column & INT_MAX);
 }
 
-// Lists a token (taking a new reference) at a position. Returns 0, or -1 with an exception set.
-int AppendToken(ReadingState* state, PyObject* token, int lineIndex, int column) {
+// Makes room for one token more than the list holds, when it has none. Kept apart from the
+// append, which runs for every token, so that the append stays small enough to inline.
+// Returns 0, or -1 with an exception set.
+[[gnu::noinline]] int GrowTokens(ReadingState* state) {
   if (state->fTokenCount == INT_MAX) {
     PyErr_SetString(PyExc_ValueError, "Too many tokens in line");
     return -1;
@@ -60,6 +62,13 @@ int AppendToken(ReadingState* state, PyObject* token, int lineIndex, int column)
     PyErr_NoMemory();
     return -1;
   }
+  return 0;
+}
+
+// Lists a token (taking a new reference) at a position. Returns 0, or -1 with an exception set.
+int AppendToken(ReadingState* state, PyObject* token, int lineIndex, int column) {
+  if (static_cast<size_t>(state->fTokenCount) >= state->fTokenCapacity && GrowTokens(state) != 0)
+    return -1;
   Py_INCREF(token);
   state->fTokenArray[state->fTokenCount] = token;
   state->fTokenPositions[state->fTokenCount] =

@@ -5,6 +5,7 @@
 
 #include "lines/classifier.h"
 
+#include <cstdint>
 #include <string_view>
 
 #include "core/token_ids.h"
@@ -33,7 +34,20 @@ constexpr StatementWord kStatementKeywordTable[] = {
 static_assert(sizeof(kStatementKeywordTable) / sizeof(kStatementKeywordTable[0]) == 22,
               "21 statement words and the closing row");
 
+// For each first byte, the lengths of the statement words that begin with it, as bits: most
+// key tokens are names that no statement word could be, and are turned away without a search.
+struct WordShapes {
+  uint16_t fLengths[256];
+  constexpr WordShapes() : fLengths() {
+    for (const StatementWord* row = kStatementKeywordTable; !row->fWord.empty(); row++)
+      fLengths[static_cast<unsigned char>(row->fWord[0])] |= uint16_t{1} << row->fWord.size();
+  }
+};
+constexpr WordShapes kWordShapes;
+static_assert(kWordShapes.fLengths['c'] == (1 << 5 | 1 << 8), "class, continue");
+
 const StatementWord* FindStatementWord(const TokenText& text) {
+  if (text.fLength >= 16 || !(kWordShapes.fLengths[text.At(0)] >> text.fLength & 1)) return nullptr;
   for (const StatementWord* row = kStatementKeywordTable; !row->fWord.empty(); row++) {
     if (text.Is(row->fWord)) return row;
   }

@@ -44,19 +44,19 @@ PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
   return PyObject_Call(hook, hookArgs.Get(), nullptr);
 }
 
-// Fills the token references, positions and line text. They share one heap block, in that
-// order, so that a line costs a single allocation. Returns -1 with MemoryError set.
-int FillStorage(LogicalLine* line, const LineParts& parts) {
+// The storage a line needs after its record: token references, positions, line text.
+size_t StorageBytes(const LineParts& parts) {
+  const size_t count = static_cast<size_t>(parts.fTokenCount);
+  const size_t textBytes = parts.fLineText ? parts.fLineTextLength + 1 : 0;
+  return count * (sizeof(PyObject*) + sizeof(TokenPosition)) + textBytes;
+}
+
+// Fills the token references, positions and line text into the line's storage, in that order.
+void FillStorage(LogicalLine* line, const LineParts& parts) {
   const size_t count = static_cast<size_t>(parts.fTokenCount);
   const size_t tokenBytes = count * sizeof(PyObject*);
   const size_t positionBytes = count * sizeof(TokenPosition);
-  const size_t textBytes = parts.fLineText ? parts.fLineTextLength + 1 : 0;
-  // The interpreter's allocator: most blocks are small, which it serves faster than malloc.
-  char* block = static_cast<char*>(PyMem_Malloc(tokenBytes + positionBytes + textBytes + 1));
-  if (!block) {
-    PyErr_NoMemory();
-    return -1;
-  }
+  char* block = LineStorage(line);
   line->fTokenArray = reinterpret_cast<PyObject**>(block);
   for (size_t i = 0; i < count; i++) {
     Py_INCREF(parts.fTokens[i]);
@@ -70,7 +70,6 @@ int FillStorage(LogicalLine* line, const LineParts& parts) {
     memcpy(line->fLineText, parts.fLineText, parts.fLineTextLength);
     line->fLineText[parts.fLineTextLength] = '\0';
   }
-  return 0;
 }
 
 uint8_t FlagIf(int condition, LineFlag flag) { return condition ? flag : 0; }
@@ -79,10 +78,10 @@ uint8_t FlagIf(int condition, LineFlag flag) { return condition ? flag : 0; }
 
 PyObject* CreateNativeLogicalLine(const LineParts& parts) {
   if (!PartsAreValid(parts)) return nullptr;
-  LogicalLine* line = NewLogicalLine();
+  LogicalLine* line = NewLogicalLine(StorageBytes(parts));
   if (!line) return nullptr;
   PyRef owner = PyRef::Steal(reinterpret_cast<PyObject*>(line));  // releases a half-built line
-  if (FillStorage(line, parts) != 0) return nullptr;
+  FillStorage(line, parts);
   line->fIndentLevel = static_cast<int16_t>(parts.fIndentLevel);
   line->fStoredFirstLine = parts.fFirstLine;
   line->fLineCount = static_cast<int16_t>(parts.fLineCount);

@@ -36,9 +36,8 @@ int LineClear(PyObject* self) {
 void LineDealloc(PyObject* self) {
   PyObject_GC_UnTrack(self);
   LogicalLine* line = AsLine(self);
-  // The positions and the line text live in the token array's block.
+  // The positions and the line text are in the record's storage, freed with it.
   for (int i = 0; i < line->fTokenCount; i++) Py_DECREF(line->fTokenArray[i]);
-  PyMem_Free(line->fTokenArray);
   DetachLine(line);
   ClearAppended(line);
   Py_XDECREF(line->fScopeName);
@@ -56,6 +55,7 @@ PyTypeObject LogicalLineType = {
     .ob_base = PyVarObject_HEAD_INIT(nullptr, 0)
     .tp_name = "LogicalLine",
     .tp_basicsize = sizeof(LogicalLine),
+    .tp_itemsize = 1,
     .tp_dealloc = LineDealloc,
     .tp_flags = Py_TPFLAGS_DEFAULT | Py_TPFLAGS_HAVE_GC,  // no subclassing, no constructor
     .tp_traverse = LineTraverse,
@@ -63,8 +63,14 @@ PyTypeObject LogicalLineType = {
 };
 #pragma GCC diagnostic pop
 
-LogicalLine* NewLogicalLine() {
-  LogicalLine* line = PyObject_GC_New(LogicalLine, &LogicalLineType);  // untracked
+LogicalLine* NewLogicalLine(size_t storage) {
+  static_assert(sizeof(LogicalLine) % alignof(PyObject*) == 0, "the storage starts aligned");
+  if (storage > static_cast<size_t>(PY_SSIZE_T_MAX) - sizeof(LogicalLine)) {
+    PyErr_NoMemory();
+    return nullptr;
+  }
+  LogicalLine* line = PyObject_GC_NewVar(LogicalLine, &LogicalLineType,  // untracked
+                                         static_cast<Py_ssize_t>(storage));
   if (!line) return nullptr;
   const ObjectList empty = {.fItems = nullptr, .fCount = 0, .fCapacity = 0};
   line->fTokenArray = nullptr;

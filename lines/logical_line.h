@@ -18,11 +18,12 @@ enum LineFlag : uint8_t {
   kIncompleteFlag = 8,
 };
 
+// The record is followed by its storage, ob_size bytes: the token references, then their
+// positions, then the line text. One allocation makes a line, and one frees it.
 struct LogicalLine {
-  PyObject_HEAD
-  PyObject** fTokenArray;          // fTokenCount owned bytes objects; a heap block that also
-                                   // holds fTokenPositions and fLineText
-  TokenPosition* fTokenPositions;  // fTokenCount positions inside fTokenArray's block
+  PyObject_VAR_HEAD
+  PyObject** fTokenArray;          // fTokenCount owned bytes objects, in the storage
+  TokenPosition* fTokenPositions;  // fTokenCount positions, in the storage
   int32_t fTokenCount;
   int16_t fIndentLevel;
   int16_t fLineCount;
@@ -32,7 +33,7 @@ struct LogicalLine {
   ObjectList fNames;           // base classes, argument names or attributes, by fType
   ObjectList fTypeEquivs;      // pairs, two entries each
   ObjectList fArgTypeEquivs;   // pairs, two entries each
-  char* fLineText;             // own NUL-terminated copy inside fTokenArray's block, or null
+  char* fLineText;             // own NUL-terminated copy in the storage, or null
   PyObject* fTokensTuple;      // cache of fTokens; the tokens never change once set
   PyObject* fLocalScopeName;   // the defined name on a class or function line, else None
   // Where the line starts: its first physical line, and that line's offset in the text read.
@@ -72,8 +73,11 @@ void AttachLine(LogicalLine* line, ShiftTable* table, uint32_t group);
 // Takes the line out of the numbering it shares, if any, keeping its numbers.
 void DetachLine(LogicalLine* line);
 
-// Returns a new record in the fresh state (no tokens, type kUnknown, fLocalScopeName None).
-LogicalLine* NewLogicalLine();
+// Returns a new record in the fresh state (no tokens, type kUnknown, fLocalScopeName None),
+// with `storage` bytes of storage after it, at LineStorage.
+LogicalLine* NewLogicalLine(size_t storage);
+
+inline char* LineStorage(LogicalLine* line) { return reinterpret_cast<char*>(line + 1); }
 
 // Has the cyclic collector watch the line, from the first object the host stores in it.
 void TrackLine(LogicalLine* line);

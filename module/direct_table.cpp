@@ -14,7 +14,7 @@
 
 namespace {
 
-PyObject* CreateEmptyLogical() { return reinterpret_cast<PyObject*>(NewLogicalLine()); }
+PyObject* CreateEmptyLogical() { return reinterpret_cast<PyObject*>(NewLogicalLine(0)); }
 
 int IsLogical(PyObject* object) { return Py_TYPE(object) == &LogicalLineType; }
 

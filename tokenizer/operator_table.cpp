@@ -107,9 +107,12 @@ const OperatorEntry* FindOperator(const OperatorTable* table, const char* p, con
   const int start = table->fGroupStart[static_cast<unsigned char>(first)];
   if (start < 0) return nullptr;
   const OperatorEntry* last = table->fByText + table->fByTextCount;
+  const OperatorEntry* row = table->fByText + start;
+  // Brackets and commas, the most common operators, are one byte that no other operator starts
+  // with: their group is that one row.
+  if (row->fSpelling[1] == '\0' && (row + 1 == last || row[1].fSpelling[0] != first)) return row;
   const OperatorEntry* found = nullptr;
-  for (const OperatorEntry* row = table->fByText + start; row < last && row->fSpelling[0] == first;
-       row++) {
+  for (; row < last && row->fSpelling[0] == first; row++) {
     if (SpellingMatches(row->fSpelling, p, end)) found = row;
   }
   return found;
