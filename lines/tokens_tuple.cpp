@@ -110,10 +110,15 @@ bool IsSharedText(PyObject* token) { return PyBytes_GET_SIZE(token) <= kSharedTe
 PyObject* SharedText(PyObject* token) {
   const TokenText text(token);
   TextSlot& slot = gTexts[HashText(text.fBytes, text.fLength) & (kTextSlots - 1)];
-  if (slot.fToken && (slot.fToken == token || (PyBytes_GET_SIZE(slot.fToken) == text.fLength &&
-                                               memcmp(PyBytes_AS_STRING(slot.fToken), text.fBytes,
-                                                      static_cast<size_t>(text.fLength)) == 0)))
+  if (slot.fToken == token) return slot.fText;
+  if (slot.fToken && PyBytes_GET_SIZE(slot.fToken) == text.fLength &&
+      memcmp(PyBytes_AS_STRING(slot.fToken), text.fBytes, static_cast<size_t>(text.fLength)) == 0) {
+    // The same text from another read: each read has its own token objects, and the rest of
+    // this one will ask with this object, which is then found without comparing texts.
+    Py_INCREF(token);
+    Py_SETREF(slot.fToken, token);
     return slot.fText;
+  }
   PyObject* shown = TokenStr(token);
   if (!shown) return nullptr;
   Py_INCREF(token);
