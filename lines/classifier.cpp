@@ -44,7 +44,8 @@ struct WordShapes {
   }
 };
 constexpr WordShapes kWordShapes;
-static_assert(kWordShapes.fLengths['c'] == (1 << 5 | 1 << 8), "class, continue");
+static_assert(kWordShapes.fLengths[static_cast<unsigned char>('c')] == (1 << 5 | 1 << 8),
+              "class and continue");
 
 const StatementWord* FindStatementWord(const TokenText& text) {
   if (text.fLength >= 16 || !(kWordShapes.fLengths[text.At(0)] >> text.fLength & 1)) return nullptr;
