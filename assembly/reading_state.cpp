@@ -8,14 +8,8 @@
 
 #include "core/growth.h"
 
-int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
-                     const char* data, const char* dataEnd, int64_t firstLine) {
-  state->fCache = static_cast<TokenCache*>(PyMem_Malloc(sizeof(TokenCache)));
-  if (!state->fCache) {
-    PyErr_NoMemory();
-    return -1;
-  }
-  InitTokenCache(state->fCache);
+void InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
+                      const char* data, const char* dataEnd, int64_t firstLine) {
   state->fOptions = options;
   state->fReadline = readline;
   state->fData = data;
@@ -36,7 +30,6 @@ int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* 
   state->fLineStarts = state->fInlineLineStarts;
   state->fLineStartCapacity = kInlineLineStarts;
   StartLogicalLine(state);
-  return 0;
 }
 
 void StartLogicalLine(ReadingState* state) {
@@ -59,8 +52,6 @@ void ReleaseReadingState(ReadingState* state) {
   if (state->fLineStarts != state->fInlineLineStarts) free(state->fLineStarts);
   ResetTextBuffer(&state->fText);
   ResetTextBuffer(&state->fPending);
-  ClearTokenCache(state->fCache);
-  PyMem_Free(state->fCache);
 }
 
 int NoteLineStart(ReadingState* state, int offset) {

@@ -10,7 +10,6 @@
 #include <cstdint>
 
 #include "assembly/line_parts.h"
-#include "assembly/token_cache.h"
 #include "core/text_buffer.h"
 #include "core/token_position.h"
 #include "tokenizer/token_start.h"
@@ -31,7 +30,6 @@ struct ReadingState {
   int64_t fSourceOffset;   // bytes the source has handed out so far
   int64_t fPendingOffset;  // where the pending line starts in the source
   int64_t fLineOffset;     // where the physical line read last starts in the source
-  TokenCache* fCache;    // texts shared by the whole call
   // The logical line being built.
   TextBuffer fText;      // every physical line read for it, line breaks included
   ScanState fScan;       // carried from one physical line to the next
@@ -51,8 +49,8 @@ struct ReadingState {
 };
 
 // Sets up a call's state, reading through readline, or from [data, dataEnd) when readline is
-// null. Returns 0, or -1 with MemoryError set (nothing to release then).
-int InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
+// null.
+void InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
                      const char* data, const char* dataEnd, int64_t firstLine);
 
 // Releases every reference and block the state holds.

@@ -1,5 +1,6 @@
-// Token texts shared within one reading call: the same name, number or operator text read
-// again hands out the same immutable bytes object instead of a new one.
+// Token texts shared by every read: the same name or number text read again, in this call or a
+// later one, hands out the same immutable bytes object instead of a new one. Most names recur
+// from file to file, so a table that outlives the call is made once and then only found.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN
@@ -11,39 +12,17 @@
 #include "core/token_ids.h"
 
 constexpr Py_ssize_t kCachedTextLimit = 40;  // longer texts are rarely repeated
-constexpr size_t kInlineCacheSlots = 256;   // what a short source needs; a power of two
-
-// A text is known by its first eight bytes and its last eight (zero-padded words), and its
-// length: that is the whole text up to 16 bytes, and the rest is compared only beyond that.
-struct CacheSlot {
-  PyObject* fBytes;  // owned, or null
-  uint64_t fHead;
-  uint64_t fTail;
-  uint32_t fHash;    // of the head, the tail and the length
-  uint32_t fLength;
-};
-
-// Direct-mapped: a miss replaces the slot. It starts small, so that a short source costs
-// little to set up, and grows with the texts it holds.
-struct TokenCache {
-  CacheSlot* fSlots;  // fInline, or a heap block
-  size_t fSlotCount;
-  size_t fFilled;     // slots that hold a text
-  CacheSlot fInline[kInlineCacheSlots];
-  PyObject* fById[kTokenIdLimit];  // owned fixed texts of operators and the string placeholder
-};
-
-void InitTokenCache(TokenCache* cache);
-
-// Releases every object that the cache holds, and its storage; the cache is not used again.
-void ClearTokenCache(TokenCache* cache);
 
 // Returns a new reference to a bytes object holding the n bytes at p, which lie in a text with
-// the padding of a TextBuffer after it.
-PyObject* CachedBytes(TokenCache* cache, const char* p, Py_ssize_t n);
+// the padding of a TextBuffer after it. Shared texts stay in a table for the life of the process
+// until another text takes their place.
+PyObject* CachedBytes(const char* p, Py_ssize_t n);
+
+// The fixed texts: operators' canonical texts and the string placeholder, one bytes object per
+// token id for the process (the module has one operator table).
 
 // Returns a new reference to the fixed text stored for a token id, or nullptr if none is.
-PyObject* CachedFixedText(TokenCache* cache, int id);
+PyObject* CachedFixedText(int id);
 
 // Stores the fixed text that stands for a token id; returns a new reference to it.
-PyObject* StoreFixedText(TokenCache* cache, int id, const char* text);
+PyObject* StoreFixedText(int id, const char* text);

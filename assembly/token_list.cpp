@@ -9,6 +9,7 @@
 #include <cstdint>
 #include <cstring>
 
+#include "assembly/token_cache.h"
 #include "core/growth.h"
 #include "core/py_ref.h"
 #include "core/token_ids.h"
@@ -81,12 +82,12 @@ int AppendToken(ReadingState* state, PyObject* token, int lineIndex, int column)
 }
 
 // Returns the token object of an id whose text is fixed: an operator's canonical text, or the
-// string placeholder. Made once per reading call.
+// string placeholder. Made once for the process.
 PyObject* FixedToken(ReadingState* state, int id) {
-  if (PyObject* known = CachedFixedText(state->fCache, id)) return known;
+  if (PyObject* known = CachedFixedText(id)) return known;
   const char* text = id == STRING_TOKEN ? kStringPlaceholder
                                         : OperatorText(state->fOptions.fOperatorTable, id);
-  return StoreFixedText(state->fCache, id, text);
+  return StoreFixedText(id, text);
 }
 
 // Places a token that may have begun on an earlier physical line: on the line, as read, that
@@ -119,7 +120,7 @@ PyObject* MakeToken(ReadingState* state, int lineStart, int* lineIndex, int* col
   switch (scan.fTokenId) {
     case NAME_TOKEN:
     case NUMBER_TOKEN:
-      return CachedBytes(state->fCache, text + scan.fStart, scan.fEnd - scan.fStart);
+      return CachedBytes(text + scan.fStart, scan.fEnd - scan.fStart);
     case COMMENT_TOKEN:  // rarely repeated: not worth a cache slot
       return PyBytes_FromStringAndSize(text + scan.fStart, scan.fEnd - scan.fStart);
     case STRING_TOKEN:

@@ -31,26 +31,29 @@ struct TextSlot {
 };
 TextSlot gTexts[kTextSlots];
 
-// Whole entries, by the shared text and position they hold: the same token at the same place
-// recurs from line to line ("self" at column 8, "=" after a short name). Two ways to a set,
-// the one used last first: a pair of entries that take turns in one set would otherwise
-// replace each other on every use.
-constexpr uintptr_t kEntrySets = 8192;  // a power of two
-struct EntrySet {
-  PyObject* fWays[2];  // owned (text, position) tuples, or null
+// Whole entries, by the token object and the position they stand for. Short token texts are
+// shared by every read, so the same token at the same place recurs from line to line and from
+// file to file ("self" at column 8, "=" after a short name), and a hit reads neither the token
+// nor its text. A slot holds its token, so that no other object can take the token's address
+// while the slot names it. Two ways to a set, the one used last first, in one cache line: two
+// entries that take turns in a set keep both.
+struct EntrySlot {
+  PyObject* fToken;    // owned, or null
+  PyObject* fEntry;    // owned (text, position) tuple
+  uint32_t fPosition;  // line index in the high half, column in the low
 };
+struct alignas(64) EntrySet {
+  EntrySlot fWays[2];
+};
+constexpr uintptr_t kEntrySets = 8192;  // a power of two
 EntrySet gEntries[kEntrySets];
 
-// Objects sit at multiples of 16 bytes, a few size classes apart: multiplying spreads the
-// pair over every set, where a sum of the pointers would crowd a few.
-uintptr_t EntrySetOf(PyObject* text, PyObject* position) {
-  const uint64_t mixed = (reinterpret_cast<uint64_t>(text) * 0x9E3779B97F4A7C15ull) ^
-                         reinterpret_cast<uint64_t>(position);
-  return static_cast<uintptr_t>((mixed * 0xFF51AFD7ED558CCDull) >> 40) & (kEntrySets - 1);
-}
+uint32_t PositionKey(TokenPosition at) { return uint32_t{at.fLine} << 16 | at.fColumn; }
 
-bool EntryHolds(PyObject* entry, PyObject* text, PyObject* position) {
-  return entry && PyTuple_GET_ITEM(entry, 0) == text && PyTuple_GET_ITEM(entry, 1) == position;
+// Objects sit at multiples of 16 bytes: multiplying spreads the pair over every set.
+uintptr_t EntrySetOf(PyObject* token, uint32_t position) {
+  const uint64_t mixed = (reinterpret_cast<uint64_t>(token) ^ position) * 0x9E3779B97F4A7C15ull;
+  return static_cast<uintptr_t>(mixed >> 40) & (kEntrySets - 1);
 }
 
 PyObject* NewPair(PyObject* first, PyObject* second) {
@@ -138,9 +141,8 @@ PyObject* TextOf(PyObject* token) {
   return shown;
 }
 
-// Returns a new reference to the entry of a token at a position. When both parts are shared,
-// so is the entry, found by the two objects it holds: a hit touches neither of them.
-PyObject* TokenEntry(PyObject* token, TokenPosition at) {
+// Returns a new reference to the entry of a token at a position, made anew.
+PyObject* NewEntry(PyObject* token, TokenPosition at) {
   if (!IsSharedText(token) || !IsSharedPosition(at)) {
     PyRef position = PyRef::Steal(PositionTuple(at));
     PyRef text = PyRef::Steal(position ? TextOf(token) : nullptr);
@@ -149,28 +151,39 @@ PyObject* TokenEntry(PyObject* token, TokenPosition at) {
   PyObject* position = SharedPosition(at);
   PyObject* text = position ? SharedText(token) : nullptr;
   if (!text) return nullptr;
-  EntrySet& set = gEntries[EntrySetOf(text, position)];
-  PyObject* first = set.fWays[0];
-  if (EntryHolds(first, text, position)) {
-    Py_INCREF(first);
-    return first;
-  }
-  PyObject* second = set.fWays[1];
-  if (EntryHolds(second, text, position)) {
-    set.fWays[1] = first;
-    set.fWays[0] = second;
-    Py_INCREF(second);
-    return second;
-  }
   const PyRef held = PyRef::FromBorrowed(text);  // through the tuple's allocation
-  PyObject* entry = NewPair(text, position);
+  return NewPair(text, position);
+}
+
+// Returns a new reference to the entry of a token at a position: the shared one when a short
+// token at a shared position has one.
+PyObject* TokenEntry(PyObject* token, TokenPosition at) {
+  if (!IsSharedPosition(at)) return NewEntry(token, at);
+  const uint32_t position = PositionKey(at);
+  EntrySet& set = gEntries[EntrySetOf(token, position)];
+  EntrySlot& first = set.fWays[0];
+  if (first.fToken == token && first.fPosition == position) {
+    Py_INCREF(first.fEntry);
+    return first.fEntry;
+  }
+  if (set.fWays[1].fToken == token && set.fWays[1].fPosition == position) {
+    const EntrySlot found = set.fWays[1];
+    set.fWays[1] = first;
+    first = found;
+    Py_INCREF(found.fEntry);
+    return found.fEntry;
+  }
+  if (!IsSharedText(token)) return NewEntry(token, at);
+  PyObject* entry = NewEntry(token, at);
   if (!entry) return nullptr;
-  // That allocation may have run a finalizer that filled the set: take it as it is now.
-  PyObject* dropped = set.fWays[1];
-  set.fWays[1] = set.fWays[0];
-  set.fWays[0] = entry;
+  // Making it may have run a finalizer that filled the set: take the set as it is now.
+  const EntrySlot dropped = set.fWays[1];
+  set.fWays[1] = first;
+  Py_INCREF(token);
   Py_INCREF(entry);
-  Py_XDECREF(dropped);
+  first = EntrySlot{.fToken = token, .fEntry = entry, .fPosition = position};
+  Py_XDECREF(dropped.fToken);  // a bytes object and a tuple of str and ints: their release
+  Py_XDECREF(dropped.fEntry);  // runs no Python code
   return entry;
 }
 

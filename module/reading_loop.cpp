@@ -50,9 +50,7 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
   PyRef list = PyRef::Steal(PyList_New(0));
   if (!list) return nullptr;
   ReadingState state;
-  if (InitReadingState(&state, ParserOptions(self), readline,
-                       data, dataEnd, firstLine) != 0)
-    return nullptr;
+  InitReadingState(&state, ParserOptions(self), readline, data, dataEnd, firstLine);
   // A whole buffer read to its end without a NUL byte, the usual case, needs no search of every
   // line for one; a window that stops early is searched line by line, never past its end.
   if (!readline && lineCount == -1)

@@ -194,8 +194,7 @@ int ReRead(PyObject* parser, PyObject* lines, const Edit& edit, const char* data
   const char* from = StartOf(lines, data, dataEnd, start, &whole);
   if (!from) return -1;
   ReadingState state;
-  if (InitReadingState(&state, ParserOptions(parser), nullptr, from, dataEnd, start) != 0)
-    return -1;
+  InitReadingState(&state, ParserOptions(parser), nullptr, from, dataEnd, start);
   state.fAtStart = start == 0;  // a byte-order mark counts only at the start of the text
   state.fSourceOffset = from - data;
   int status = 0;
