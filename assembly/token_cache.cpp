@@ -21,7 +21,9 @@ struct CacheSlot {
 };
 
 // Two ways to a set, the one used last first, in one cache line: two texts that take turns in
-// a set keep both.
+// a set keep both. A new text takes the second way, and the first only once it is found again,
+// so that a run of texts seen once (numbers in a long literal, fresh names) passes through the
+// second ways and leaves the texts that recur in the first.
 struct alignas(64) CacheSet {
   CacheSlot fWays[2];
 };
@@ -60,8 +62,7 @@ PyObject* CachedBytes(const char* p, Py_ssize_t n) {
   PyObject* bytes = PyBytes_FromStringAndSize(p, n);
   if (!bytes) return nullptr;
   PyObject* dropped = set.fWays[1].fBytes;
-  set.fWays[1] = first;
-  first = CacheSlot{.fBytes = bytes, .fHead = head, .fTail = tail, .fLength = n};
+  set.fWays[1] = CacheSlot{.fBytes = bytes, .fHead = head, .fTail = tail, .fLength = n};
   Py_INCREF(bytes);
   Py_XDECREF(dropped);  // a bytes object: its release runs no Python code
   return bytes;

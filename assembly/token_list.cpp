@@ -119,9 +119,9 @@ PyObject* MakeToken(ReadingState* state, int lineStart, int* lineIndex, int* col
   *column = scan.fStart - lineStart;
   switch (scan.fTokenId) {
     case NAME_TOKEN:
-    case NUMBER_TOKEN:
       return CachedBytes(text + scan.fStart, scan.fEnd - scan.fStart);
-    case COMMENT_TOKEN:  // rarely repeated: not worth a cache slot
+    case NUMBER_TOKEN:   // rarely repeated, and a long literal holds little else: they would
+    case COMMENT_TOKEN:  // only push the names out of the cache
       return PyBytes_FromStringAndSize(text + scan.fStart, scan.fEnd - scan.fStart);
     case STRING_TOKEN:
       if (scan.fStart < lineStart) PlaceToken(state, scan.fStart, lineIndex, column);

@@ -36,7 +36,8 @@ TextSlot gTexts[kTextSlots];
 // file to file ("self" at column 8, "=" after a short name), and a hit reads neither the token
 // nor its text. A slot holds its token, so that no other object can take the token's address
 // while the slot names it. Two ways to a set, the one used last first, in one cache line: two
-// entries that take turns in a set keep both.
+// entries that take turns in a set keep both. A new entry takes the second way and moves to
+// the first only when it is found again, so entries used once pass through the second ways.
 struct EntrySlot {
   PyObject* fToken;    // owned, or null
   PyObject* fEntry;    // owned (text, position) tuple
@@ -178,10 +179,9 @@ PyObject* TokenEntry(PyObject* token, TokenPosition at) {
   if (!entry) return nullptr;
   // Making it may have run a finalizer that filled the set: take the set as it is now.
   const EntrySlot dropped = set.fWays[1];
-  set.fWays[1] = first;
   Py_INCREF(token);
   Py_INCREF(entry);
-  first = EntrySlot{.fToken = token, .fEntry = entry, .fPosition = position};
+  set.fWays[1] = EntrySlot{.fToken = token, .fEntry = entry, .fPosition = position};
   Py_XDECREF(dropped.fToken);  // a bytes object and a tuple of str and ints: their release
   Py_XDECREF(dropped.fEntry);  // runs no Python code
   return entry;
