@@ -7,6 +7,8 @@
 #include <cstdint>
 #include <cstring>
 
+#include "tokenizer/operator_table.h"
+#include "tokenizer/token_start.h"
 #include "tokenizer/token_text.h"
 
 namespace {
@@ -66,6 +68,19 @@ PyObject* CachedBytes(const char* p, Py_ssize_t n) {
   Py_INCREF(bytes);
   Py_XDECREF(dropped);  // a bytes object: its release runs no Python code
   return bytes;
+}
+
+bool IsSharedToken(PyObject* token) {
+  const TokenText text(token);
+  const Py_ssize_t n = text.fLength;
+  if (n <= 1) return true;
+  if (n > kCachedTextLimit) return false;
+  const int id = TokenIdForStart(&kOperatorTable, text.fBytes, text.fBytes + n);
+  if (id != NAME_TOKEN) return gFixedTexts[id] == token;
+  // Found as CachedBytes finds it; a token object has nothing readable past its text.
+  const uint64_t tail = n > 8 ? WordAt(text.fBytes + n - 8, 8) : 0;
+  const CacheSet& set = gTexts[HashWords(HeadWord(text.fBytes, n), tail, n) & (kCacheSets - 1)];
+  return set.fWays[0].fBytes == token || set.fWays[1].fBytes == token;
 }
 
 PyObject* CachedFixedText(int id) {

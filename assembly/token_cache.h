@@ -21,6 +21,11 @@ PyObject* CachedBytes(const char* p, Py_ssize_t n);
 // The fixed texts: operators' canonical texts and the string placeholder, one bytes object per
 // token id for the process (the module has one operator table).
 
+// True when the token is the object that every read hands out for its text, for now: a name
+// the table holds, a fixed text, or a text of one byte (the interpreter keeps one object for
+// each byte value). Numbers, comments and strings of their own are new objects every time.
+bool IsSharedToken(PyObject* token);
+
 // Returns a new reference to the fixed text stored for a token id, or nullptr if none is.
 PyObject* CachedFixedText(int id);
 

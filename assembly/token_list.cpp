@@ -67,7 +67,8 @@ void MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
 }
 
 // Lists a token (taking a new reference) at a position. Returns 0, or -1 with an exception set.
-int AppendToken(ReadingState* state, PyObject* token, int lineIndex, int column) {
+[[gnu::always_inline]] inline int AppendToken(ReadingState* state, PyObject* token, int lineIndex,
+                                              int column) {
   if (static_cast<size_t>(state->fTokenCount) >= state->fTokenCapacity && GrowTokens(state) != 0)
     return -1;
   Py_INCREF(token);

@@ -11,6 +11,7 @@
 #include <cstdint>
 #include <cstring>
 
+#include "assembly/token_cache.h"
 #include "core/py_ref.h"
 #include "tokenizer/token_queries.h"
 #include "tokenizer/token_text.h"
@@ -174,7 +175,8 @@ PyObject* TokenEntry(PyObject* token, TokenPosition at) {
     Py_INCREF(found.fEntry);
     return found.fEntry;
   }
-  if (!IsSharedText(token)) return NewEntry(token, at);
+  // A token made for its read alone would only hold its slot until another pushed it out.
+  if (!IsSharedToken(token)) return NewEntry(token, at);
   PyObject* entry = NewEntry(token, at);
   if (!entry) return nullptr;
   // Making it may have run a finalizer that filled the set: take the set as it is now.

@@ -2,6 +2,10 @@
 // that this rule and the line scanner share.
 #pragma once
 
+#include <cstdint>
+
+#include "core/token_ids.h"
+#include "tokenizer/code_units.h"
 #include "tokenizer/operator_table.h"
 
 // The scanner's result and carry-over record.
@@ -23,7 +27,72 @@ constexpr ScanState kFreshScan = {
 // ERROR_TOKEN and returns nullptr.
 const char* ScanStringStart(const char* p, const char* end, ScanState* state);
 
+// What a first byte can begin. The rule tries, in order, a string, a name, a line break, a
+// number, a comment and an operator; the class of the byte says which of them can hold.
+enum class Start : uint8_t {
+  kName,          // a letter that no string prefix begins with, or "_"
+  kNameOrString,  // r, b, u, f in either case: a string when a quote follows the prefix
+  kString,        // a quote
+  kNumber,        // an ASCII digit
+  kDot,           // a number when a digit follows, else an operator
+  kComment,       // "#"
+  kLineBreak,     // LF, CR
+  kNonAscii,      // a name when the character is a letter, else an error
+  kOther,         // an operator, or an error when no operator begins here
+};
+
+constexpr Start StartOf(unsigned b) {
+  if (b >= 0x80) return Start::kNonAscii;
+  if (HasClass(b, kQuote)) return Start::kString;
+  if (HasClass(b, kPrefixLetter)) return Start::kNameOrString;
+  if (HasClass(b, kAsciiLetter) || b == '_') return Start::kName;
+  if (HasClass(b, kAsciiDigit)) return Start::kNumber;
+  if (HasClass(b, kLineBreak)) return Start::kLineBreak;
+  if (b == '.') return Start::kDot;
+  if (b == '#') return Start::kComment;
+  return Start::kOther;
+}
+
+struct StartTable {
+  Start fRows[256];
+  constexpr StartTable() : fRows() {
+    for (unsigned b = 0; b < 256; b++) fRows[b] = StartOf(b);
+  }
+};
+inline constexpr StartTable kStarts;
+
 // Returns the id of the token that begins at p in [p, end). Never fails. For an operator, the
-// row found is stored in *row when row is given.
-int TokenIdForStart(const OperatorTable* table, const char* p, const char* end,
-                    const OperatorEntry** row = nullptr);
+// row found is stored in *row when row is given. Inline: the scanner asks it of every token.
+inline int TokenIdForStart(const OperatorTable* table, const char* p, const char* end,
+                           const OperatorEntry** row = nullptr) {
+  if (p >= end) return ERROR_TOKEN;
+  switch (kStarts.fRows[Byte(p)]) {
+    case Start::kName:
+      return NAME_TOKEN;
+    case Start::kNameOrString: {
+      // A prefix is one letter or two before a quote, so a name such as "return" shows itself
+      // at its second byte.
+      if (p + 1 < end && !HasClass(Byte(p + 1), kQuote | kPrefixLetter)) return NAME_TOKEN;
+      ScanState scratch = kFreshScan;
+      return ScanStringStart(p, end, &scratch) ? STRING_TOKEN : NAME_TOKEN;
+    }
+    case Start::kString:
+      return STRING_TOKEN;
+    case Start::kNumber:
+      return NUMBER_TOKEN;
+    case Start::kComment:
+      return COMMENT_TOKEN;
+    case Start::kLineBreak:
+      return NEWLINE_TOKEN;
+    case Start::kNonAscii:
+      return IsIdentifierStart(p, end) ? NAME_TOKEN : ERROR_TOKEN;
+    case Start::kDot:
+      if (p + 1 < end && IsAsciiDigit(Byte(p + 1))) return NUMBER_TOKEN;
+      break;
+    case Start::kOther:
+      break;
+  }
+  const OperatorEntry* found = FindOperator(table, p, end);
+  if (row) *row = found;
+  return found ? found->fId : ERROR_TOKEN;
+}
