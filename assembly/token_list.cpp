@@ -11,7 +11,6 @@
 
 #include "assembly/token_cache.h"
 #include "core/growth.h"
-#include "core/py_ref.h"
 #include "core/token_ids.h"
 #include "tokenizer/line_scanner.h"
 #include "tokenizer/token_text.h"
@@ -66,12 +65,15 @@ void MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
   return 0;
 }
 
-// Lists a token (taking a new reference) at a position. Returns 0, or -1 with an exception set.
+// Lists a token at a position, taking over the reference passed (released on failure). Returns
+// 0, or -1 with an exception set.
 [[gnu::always_inline]] inline int AppendToken(ReadingState* state, PyObject* token, int lineIndex,
                                               int column) {
-  if (static_cast<size_t>(state->fTokenCount) >= state->fTokenCapacity && GrowTokens(state) != 0)
+  if (static_cast<size_t>(state->fTokenCount) >= state->fTokenCapacity &&
+      GrowTokens(state) != 0) {
+    Py_DECREF(token);
     return -1;
-  Py_INCREF(token);
+  }
   state->fTokenArray[state->fTokenCount] = token;
   state->fTokenPositions[state->fTokenCount] =
       TokenPosition{static_cast<uint16_t>(lineIndex), static_cast<uint16_t>(column)};
@@ -140,9 +142,9 @@ PyObject* MakeToken(ReadingState* state, int lineStart, int* lineIndex, int* col
 int AppendUnfinishedString(ReadingState* state) {
   int lineIndex = 0;
   int column = 0;
-  PyRef token = PyRef::Steal(MakeErrorToken(state, &lineIndex, &column));
+  PyObject* token = MakeErrorToken(state, &lineIndex, &column);
   if (!token) return -1;
-  return AppendToken(state, token.Get(), lineIndex, column);
+  return AppendToken(state, token, lineIndex, column);
 }
 
 void TruncateTokens(ReadingState* state, int index) {
@@ -176,7 +178,7 @@ int TokenizePhysicalLine(ReadingState* state, int lineStart) {
     if (!state->fScan.fComplete || !KeepToken(state)) continue;
     int lineIndex = 0;
     int column = 0;
-    PyRef token = PyRef::Steal(MakeToken(state, lineStart, &lineIndex, &column));
-    if (!token || AppendToken(state, token.Get(), lineIndex, column) != 0) return -1;
+    PyObject* token = MakeToken(state, lineStart, &lineIndex, &column);
+    if (!token || AppendToken(state, token, lineIndex, column) != 0) return -1;
   }
 }

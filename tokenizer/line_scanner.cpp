@@ -161,8 +161,8 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
       case COMMENT_TOKEN:
         pos = end;  // the comment keeps its line terminator; no newline token follows
         break;
-      default:  // an operator: its row was found with its id
-        for (const char* c = row->fSpelling; *c; c++) pos++;
+      default:  // an operator of 1 to 3 bytes: its row was found with its id
+        pos += row->fSpelling[1] == '\0' ? 1 : row->fSpelling[2] == '\0' ? 2 : 3;
         break;
     }
   }

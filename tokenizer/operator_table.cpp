@@ -42,6 +42,17 @@ constexpr bool SearchOrderHolds() {
 }
 static_assert(SearchOrderHolds(), "operator rows out of search order");
 
+// The scanner steps over an operator by its length, which it reads as 1, 2 or 3.
+constexpr bool LengthsHold() {
+  for (const OperatorEntry& row : kOperatorsByText) {
+    if (row.fSpelling[0] == '\0' || (row.fSpelling[1] != '\0' && row.fSpelling[2] != '\0' &&
+                                      row.fSpelling[3] != '\0'))
+      return false;
+  }
+  return true;
+}
+static_assert(LengthsHold(), "an operator of no byte or of more than three");
+
 constexpr bool IsCanonical(int row) {
   for (int i = 0; i < row; i++) {
     if (kOperatorsByText[i].fId == kOperatorsByText[row].fId) return false;

@@ -33,12 +33,18 @@ struct TokenText {
   }
 };
 
-// How a token with this first byte changes the bracket depth: +1 opens, -1 closes.
-inline int BracketStep(unsigned first) {
-  if (first == '(' || first == '[' || first == '{') return 1;
-  if (first == ')' || first == ']' || first == '}') return -1;
-  return 0;
-}
+// How a token with each first byte changes the bracket depth: +1 opens, -1 closes.
+struct BracketSteps {
+  signed char fRows[256];
+  constexpr BracketSteps() : fRows() {
+    for (unsigned char open : {'(', '[', '{'}) fRows[open] = 1;
+    for (unsigned char close : {')', ']', '}'}) fRows[close] = -1;
+  }
+};
+inline constexpr BracketSteps kBracketSteps;
+
+// The bracket step of a token whose text begins with `first` (a byte, or 0 for no text).
+inline int BracketStep(unsigned first) { return kBracketSteps.fRows[first & 0xFF]; }
 
 static_assert(std::endian::native == std::endian::little, "words are read little-endian");
 
