@@ -37,19 +37,15 @@ const char* SkipSpaces(const char* p, const char* end) {
   return p;
 }
 
-// Steps over a name: its first character, then every character that may continue it.
+// Steps over a name: its first character, then every character that may continue it. ASCII
+// needs no decoding, and no bounds check: the zero byte after the text is no name character.
 const char* ScanName(const char* p, const char* end) {
   p += StepOverChar(p, end);
-  while (p < end) {
-    if (Byte(p) < 0x80) {  // the common case needs no decoding
-      if (!HasClass(Byte(p), kNameChar)) break;
-      p++;
-    } else {
-      if (!IsIdentifierChar(p, end)) break;
-      p += StepOverChar(p, end);
-    }
+  for (;;) {
+    while (HasClass(Byte(p), kNameChar)) p++;
+    if (p >= end || Byte(p) < 0x80 || !IsIdentifierChar(p, end)) return p;
+    p += StepOverChar(p, end);
   }
-  return p;
 }
 
 bool IsNumberSuffixLetter(unsigned b) {
@@ -129,7 +125,7 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
     pos = ScanStringBody(state, cursor, pos);
   } else {
     pos = SkipSpaces(pos, end);
-    while (pos < end && IsBlank(Byte(pos))) pos++;
+    while (IsBlank(Byte(pos))) pos++;  // stops at the zero byte after the text at the latest
     if (pos == end) {
       cursor->fPos = end;
       cursor->fAtEnd = 1;
