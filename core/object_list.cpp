@@ -25,6 +25,7 @@ int CopyObjectList(ObjectList* target, const ObjectList* source) {
 
 void ClearObjectList(ObjectList* list) {
   PyObject** items = list->fItems;
+  if (!items) return;  // never appended to, as most are
   const Py_ssize_t count = list->fCount;
   // Emptied first: releasing an entry may run code that looks at the list again.
   *list = ObjectList{.fItems = nullptr, .fCount = 0, .fCapacity = 0};
