@@ -169,7 +169,7 @@ void TruncateTokens(ReadingState* state, int index) {
     const unsigned first = TokenText(token).At(0);
     if (IsSignificant(first)) state->fSignificantCount--;
     state->fNesting -= BracketStep(first);
-    Py_DECREF(token);
+    Py_DECREF(token);  // the line is read again, and its tokens made again
   }
   if (index < state->fTokenCount) state->fTokenCount = index;
 }

@@ -17,3 +17,7 @@ int AppendUnfinishedString(ReadingState* state);
 
 // Removes the tokens from `index` on, undoing their counters.
 void TruncateTokens(ReadingState* state, int index);
+
+// Forgets the listed tokens without releasing them: their references were handed on with the
+// line's parts. The other counters stay until the next logical line starts.
+inline void GiveUpTokens(ReadingState* state) { state->fTokenCount = 0; }

@@ -51,15 +51,21 @@ size_t StorageBytes(const LineParts& parts) {
   return count * (sizeof(PyObject*) + sizeof(TokenPosition)) + textBytes;
 }
 
-// Fills the token references, positions and line text into the line's storage, in that order.
-void FillStorage(LogicalLine* line, const LineParts& parts) {
+// Releases the parts' token references that a call took over and passes on to no line.
+void ReleaseTokens(const LineParts& parts) {
+  for (int i = 0; i < parts.fTokenCount; i++) Py_DECREF(parts.fTokens[i]);
+}
+
+// Fills the token references (new ones, or with `take` those of the parts), positions and line
+// text into the line's storage, in that order.
+void FillStorage(LogicalLine* line, const LineParts& parts, bool take) {
   const size_t count = static_cast<size_t>(parts.fTokenCount);
   const size_t tokenBytes = count * sizeof(PyObject*);
   const size_t positionBytes = count * sizeof(TokenPosition);
   char* block = LineStorage(line);
   line->fTokenArray = reinterpret_cast<PyObject**>(block);
   for (size_t i = 0; i < count; i++) {
-    Py_INCREF(parts.fTokens[i]);
+    if (!take) Py_INCREF(parts.fTokens[i]);
     line->fTokenArray[i] = parts.fTokens[i];
   }
   line->fTokenCount = parts.fTokenCount;
@@ -76,12 +82,14 @@ uint8_t FlagIf(int condition, LineFlag flag) { return condition ? flag : 0; }
 
 }  // namespace
 
-PyObject* CreateNativeLogicalLine(const LineParts& parts) {
-  if (!PartsAreValid(parts)) return nullptr;
-  LogicalLine* line = NewLogicalLine(StorageBytes(parts));
-  if (!line) return nullptr;
+PyObject* CreateNativeLogicalLine(const LineParts& parts, bool take) {
+  LogicalLine* line = PartsAreValid(parts) ? NewLogicalLine(StorageBytes(parts)) : nullptr;
+  if (!line) {
+    if (take) ReleaseTokens(parts);
+    return nullptr;
+  }
   PyRef owner = PyRef::Steal(reinterpret_cast<PyObject*>(line));  // releases a half-built line
-  FillStorage(line, parts);
+  FillStorage(line, parts, take);
   line->fIndentLevel = static_cast<int16_t>(parts.fIndentLevel);
   line->fStoredFirstLine = parts.fFirstLine;
   line->fLineCount = static_cast<int16_t>(parts.fLineCount);
@@ -97,13 +105,15 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts) {
   return owner.Release();
 }
 
-PyObject* CreateLogicalLine(const LineParts& parts) {
-  if (!PartsAreValid(parts)) return nullptr;
-  if (gCreateHook) {
+PyObject* CreateLogicalLine(const LineParts& parts, bool take) {
+  if (!gCreateHook) return CreateNativeLogicalLine(parts, take);
+  PyObject* made = nullptr;
+  if (PartsAreValid(parts)) {
     PyRef hook = PyRef::FromBorrowed(gCreateHook);  // the hook may replace itself while running
-    return CallCreateHook(hook.Get(), parts);
+    made = CallCreateHook(hook.Get(), parts);
   }
-  return CreateNativeLogicalLine(parts);
+  if (take) ReleaseTokens(parts);  // the hook's arguments hold references of their own
+  return made;
 }
 
 bool HasCreateHook() { return gCreateHook != nullptr; }

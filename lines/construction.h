@@ -8,11 +8,13 @@
 #include "assembly/line_parts.h"
 
 // Returns a new LogicalLine, or whatever the create hook returned when one is installed;
-// nullptr with an exception set on failure.
-PyObject* CreateLogicalLine(const LineParts& parts);
+// nullptr with an exception set on failure. With `take`, the call takes over the references to
+// the parts' tokens, whatever its outcome, so that a line keeps them without taking its own.
+PyObject* CreateLogicalLine(const LineParts& parts, bool take = false);
 
-// Returns a new native LogicalLine built from the parts, never consulting the hook.
-PyObject* CreateNativeLogicalLine(const LineParts& parts);
+// Returns a new native LogicalLine built from the parts, never consulting the hook; `take` as
+// for CreateLogicalLine.
+PyObject* CreateNativeLogicalLine(const LineParts& parts, bool take = false);
 
 // True once a create hook is installed: lines are then the host's own objects.
 bool HasCreateHook();

@@ -11,6 +11,7 @@
 
 #include "assembly/line_builder.h"
 #include "assembly/reading_state.h"
+#include "assembly/token_list.h"
 #include "core/py_ref.h"
 #include "lines/construction.h"
 #include "lines/logical_line.h"
@@ -28,7 +29,8 @@ int ReadLines(ReadingState* state, int64_t stop, PyObject* list, ShiftTable* tab
     const int built = BuildLogicalLine(state, &parts);
     if (built < 0) return -1;
     if (built == 0) continue;
-    PyRef line = PyRef::Steal(CreateLogicalLine(parts));
+    PyRef line = PyRef::Steal(CreateLogicalLine(parts, true));
+    GiveUpTokens(state);  // taken over by the call, whatever its outcome
     if (!line) return -1;
     if (line.Get() == Py_None) continue;
     if (table && Py_TYPE(line.Get()) == &LogicalLineType &&

@@ -15,6 +15,7 @@
 
 #include "assembly/line_builder.h"
 #include "assembly/reading_state.h"
+#include "assembly/token_list.h"
 #include "core/py_ref.h"
 #include "lines/construction.h"
 #include "lines/logical_line.h"
@@ -214,7 +215,8 @@ int ReRead(PyObject* parser, PyObject* lines, const Edit& edit, const char* data
       status = built;
       continue;
     }
-    PyRef line = PyRef::Steal(CreateNativeLogicalLine(parts));
+    PyRef line = PyRef::Steal(CreateNativeLogicalLine(parts, true));
+    GiveUpTokens(&state);  // taken over by the call, whatever its outcome
     if (!line || PyList_Append(added, line.Get()) != 0) status = -1;
   }
   *stop = state.fAtEnd ? INT64_MAX : state.fLineNumber;
