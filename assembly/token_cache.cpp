@@ -30,7 +30,7 @@ struct alignas(64) CacheSet {
   CacheSlot fWays[2];
 };
 
-constexpr size_t kCacheSets = 8192;  // a power of two: 16,384 texts in 512 KB
+constexpr size_t kCacheSets = 4096;  // a power of two: 8,192 texts in 256 KB
 CacheSet gTexts[kCacheSets];
 
 PyObject* gFixedTexts[kTokenIdLimit];  // owned, or null

@@ -47,7 +47,7 @@ struct EntrySlot {
 struct alignas(64) EntrySet {
   EntrySlot fWays[2];
 };
-constexpr uintptr_t kEntrySets = 8192;  // a power of two
+constexpr uintptr_t kEntrySets = 4096;  // a power of two
 EntrySet gEntries[kEntrySets];
 
 uint32_t PositionKey(TokenPosition at) { return uint32_t{at.fLine} << 16 | at.fColumn; }
