@@ -76,13 +76,25 @@ int ScanDefinedName(PyObject* const* tokens, int key, int count, LineType* type,
   return 0;
 }
 
-bool IsStringLiteral(const TokenText& text) {
-  const unsigned first = text.At(0);
-  if (first == '"' || first == '\'') return true;
-  const unsigned second = text.At(1);
-  return (first == 'R' || first == 'U' || first == 'r' || first == 'u') &&
-         (second == '"' || second == '\'');
-}
+// What the first byte of a token says to the assignment and string scan.
+enum class Lead : uint8_t {
+  kOther,
+  kQuote,      // a string literal
+  kPrefix,     // R, U, r, u: a string literal when a quote follows
+  kEquals,     // "=" alone is an assignment at depth 0
+  kBackslash,  // "\\" alone is a continuation, passed over
+};
+
+struct LeadTable {
+  Lead fRows[256];
+  constexpr LeadTable() : fRows() {
+    for (unsigned char quote : {'"', '\''}) fRows[quote] = Lead::kQuote;
+    for (unsigned char prefix : {'R', 'U', 'r', 'u'}) fRows[prefix] = Lead::kPrefix;
+    fRows[static_cast<unsigned char>('=')] = Lead::kEquals;
+    fRows[static_cast<unsigned char>('\\')] = Lead::kBackslash;
+  }
+};
+constexpr LeadTable kLeads;
 
 // Assignments at bracket depth 0, and lines made only of string literals.
 LineType ScanAssignmentOrStrings(PyObject* const* tokens, int count) {
@@ -90,9 +102,23 @@ LineType ScanAssignmentOrStrings(PyObject* const* tokens, int count) {
   bool allStrings = true;
   for (int i = 0; i < count; i++) {
     const TokenText text(tokens[i]);
-    if (text.Is("=") && depth == 0) return kAssignment;
-    if (text.Is("\\") || IsStringLiteral(text)) continue;
-    depth += BracketStep(text.At(0));
+    const unsigned first = text.At(0);
+    switch (kLeads.fRows[first]) {
+      case Lead::kQuote:
+        continue;
+      case Lead::kPrefix:
+        if (text.At(1) == '"' || text.At(1) == '\'') continue;
+        break;
+      case Lead::kEquals:
+        if (text.fLength == 1 && depth == 0) return kAssignment;
+        break;
+      case Lead::kBackslash:
+        if (text.fLength == 1) continue;
+        break;
+      case Lead::kOther:
+        break;
+    }
+    depth += BracketStep(first);
     allStrings = false;
   }
   return allStrings ? kStringExpression : kUnknown;
