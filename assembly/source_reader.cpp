@@ -47,8 +47,12 @@ int NextPhysicalLine(ReadingState* state, PyRef* line, const char** bytes, Py_ss
   }
   *line = PyRef::Steal(PyObject_CallNoArgs(state->fReadline));
   if (!*line) return -1;
+  PyObject* read = line->Get();
   // Anything but bytes (a str included) gets the accessor's TypeError.
-  return PyBytes_AsStringAndSize(line->Get(), const_cast<char**>(bytes), size);
+  if (!PyBytes_Check(read)) return PyBytes_AsStringAndSize(read, const_cast<char**>(bytes), size);
+  *bytes = PyBytes_AS_STRING(read);
+  *size = PyBytes_GET_SIZE(read);
+  return 0;
 }
 
 }  // namespace

@@ -25,15 +25,8 @@ void ResetTextBuffer(TextBuffer* buffer) {
   InitTextBuffer(buffer);
 }
 
-int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n) {
-  if (n == 0) return 0;
-  const size_t needed = buffer->fLength + n + kTextPadding;
-  if (Grow(&buffer->fData, &buffer->fCapacity, needed, kInlineTextSize, buffer->fInline) != 0)
-    return -1;
-  memcpy(buffer->fData + buffer->fLength, bytes, n);
-  buffer->fLength += n;
-  Terminate(buffer);
-  return 0;
+int GrowTextBuffer(TextBuffer* buffer, size_t needed) {
+  return Grow(&buffer->fData, &buffer->fCapacity, needed, kInlineTextSize, buffer->fInline);
 }
 
 void TruncateText(TextBuffer* buffer, size_t length) {

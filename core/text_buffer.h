@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstring>
 
 constexpr size_t kInlineTextSize = 160;
 // Zero bytes kept after the text, its terminating NUL first: a scanner may load a whole
@@ -22,9 +23,21 @@ void InitTextBuffer(TextBuffer* buffer);
 // Frees the heap block, if any, and puts the buffer into the fresh state.
 void ResetTextBuffer(TextBuffer* buffer);
 
+// Makes room for `needed` bytes of storage. Returns 0, or -1 when storage cannot be had (no
+// Python exception is set; the buffer is unchanged).
+int GrowTextBuffer(TextBuffer* buffer, size_t needed);
+
 // Appends n bytes. Returns 0, or -1 when storage cannot be had (no Python exception is set;
-// the buffer is unchanged).
-int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n);
+// the buffer is unchanged). Inline: every physical line read is appended.
+inline int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n) {
+  if (n == 0) return 0;
+  const size_t needed = buffer->fLength + n + kTextPadding;
+  if (needed > buffer->fCapacity && GrowTextBuffer(buffer, needed) != 0) return -1;
+  memcpy(buffer->fData + buffer->fLength, bytes, n);
+  buffer->fLength += n;
+  memset(buffer->fData + buffer->fLength, 0, kTextPadding);
+  return 0;
+}
 
 // Cuts the text to `length` bytes, keeping the storage.
 void TruncateText(TextBuffer* buffer, size_t length);
