@@ -74,6 +74,18 @@ def test_positions_past_the_shared_ones():  # the first 16 lines and 256 columns
     assert [p for _, p in read(source)[0].fTokens] == [(0, 0), (0, 256), (0, 258), (1, 0), (1, 1)]
 
 
+def test_shared_texts_turn_over_without_mixing():
+    # Far more names than the process keeps, read in two rounds: the first round's token objects
+    # are released and their memory taken again, and every entry still shows its own text.
+    parser = logicalline.CreateLogicalLineParser()
+    for prefix in ("a", "b"):
+        names = [f"{prefix}{i}" for i in range(20000)]
+        lines = parser.GetLogicalLineListFromBuffer("".join(f"{n} = {n}\n" for n in names).encode())
+        assert [line.fTokens for line in lines] == [
+            ((n, (0, 0)), ("=", (0, len(n) + 1)), (n, (0, len(n) + 3))) for n in names]
+        del lines  # before the next round reads, so that its tokens may take this one's places
+
+
 @pytest.mark.parametrize("source, indent, tabs, spaces", [
     (b"\t  x\n", 10, True, True), (b" \tx\n", 8, True, True),  # tabs move to the next stop
     (b"\x0cx\n", 0, False, False),                  # a form feed counts nothing
