@@ -19,7 +19,7 @@ ROUNDS = 200
 SOURCE = (b"@deco\nclass C(Base):\n    def f(self, a,\n          b=')'):\n"
           b"        '''doc\r\n  more'''\n        return a \\\n  + b  # note\n"
           b"x = f(1,\nif y: pass\ncaf\xe9 = '\xff' <> $ \t\n# only a comment\n   \n"
-          b"import os, sys\nfrom a import (b,\n    c)\ns = 'open\n")
+          b"import os, sys  # handed back\nfrom a import (b,\n    c)\ns = 'open\n")
 STORED = ["name", ("a", "info"), b"raw"]
 UNTRUTHFUL = type("Untruthful", (), {"__bool__": lambda self: 1 / 0})()
 
