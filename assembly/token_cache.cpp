@@ -35,6 +35,10 @@ CacheSet gTexts[kCacheSets];
 
 PyObject* gFixedTexts[kTokenIdLimit];  // owned, or null
 
+CacheSet& SetOf(uint64_t head, uint64_t tail, Py_ssize_t n) {
+  return gTexts[HashWords(head, tail, n) & (kCacheSets - 1)];
+}
+
 bool SlotHolds(const CacheSlot& slot, const char* p, Py_ssize_t n, uint64_t head,
                uint64_t tail) {
   return slot.fBytes && slot.fHead == head && slot.fTail == tail && slot.fLength == n &&
@@ -47,8 +51,8 @@ bool SlotHolds(const CacheSlot& slot, const char* p, Py_ssize_t n, uint64_t head
 PyObject* CachedBytes(const char* p, Py_ssize_t n) {
   if (n > kCachedTextLimit || n <= 1) return PyBytes_FromStringAndSize(p, n);
   const uint64_t head = WordAt(p, n);
-  const uint64_t tail = n > 8 ? WordAt(p + n - 8, 8) : 0;
-  CacheSet& set = gTexts[HashWords(head, tail, n) & (kCacheSets - 1)];
+  const uint64_t tail = TailWord(p, n);
+  CacheSet& set = SetOf(head, tail, n);
   CacheSlot& first = set.fWays[0];
   if (SlotHolds(first, p, n, head, tail)) {
     Py_INCREF(first.fBytes);
@@ -77,9 +81,8 @@ bool IsSharedToken(PyObject* token) {
   if (n > kCachedTextLimit) return false;
   const int id = TokenIdForStart(&kOperatorTable, text.fBytes, text.fBytes + n);
   if (id != NAME_TOKEN) return gFixedTexts[id] == token;
-  // Found as CachedBytes finds it; a token object has nothing readable past its text.
-  const uint64_t tail = n > 8 ? WordAt(text.fBytes + n - 8, 8) : 0;
-  const CacheSet& set = gTexts[HashWords(HeadWord(text.fBytes, n), tail, n) & (kCacheSets - 1)];
+  // A token object has nothing readable past its text: its head is read a byte at a time.
+  const CacheSet& set = SetOf(HeadWord(text.fBytes, n), TailWord(text.fBytes, n), n);
   return set.fWays[0].fBytes == token || set.fWays[1].fBytes == token;
 }
 

@@ -1,6 +1,6 @@
-// Token texts shared by every read: the same name or number text read again, in this call or a
-// later one, hands out the same immutable bytes object instead of a new one. Most names recur
-// from file to file, so a table that outlives the call is made once and then only found.
+// Token texts shared by every read: the same name text read again, in this call or a later one,
+// hands out the same immutable bytes object instead of a new one. Most names recur from file to
+// file, so a table that outlives the call is made once and then only found.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN

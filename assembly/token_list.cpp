@@ -5,7 +5,6 @@
 
 #include "assembly/token_list.h"
 
-#include <bit>
 #include <climits>
 #include <cstdint>
 #include <cstring>
@@ -30,21 +29,11 @@ bool KeepToken(const ReadingState* state) {
   return true;
 }
 
-// Returns the first byte in [p, end) that is no space, or a byte past end when there is none;
-// read a word at a time, which the text's padding allows.
-const char* FirstNonSpace(const char* p, const char* end) {
-  for (; p < end; p += 8) {
-    const uint64_t others = WordAt(p, 8) ^ 0x2020202020202020ull;  // zero bytes were spaces
-    if (others) return p + std::countr_zero(others) / 8;
-  }
-  return p;
-}
-
 // Measures the indentation: tabs advance to the next tab stop, blanks count one, form feeds
 // and vertical tabs count nothing. Counted modulo 2**31, so that an absurdly wide indentation
 // keeps its low 16 bits and never turns negative.
 void MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
-  if (const char* first = FirstNonSpace(p, tokenStart); first == tokenStart) {
+  if (SkipSpaces(p) == tokenStart) {
     state->fSpacesInIndent = tokenStart > p;  // spaces alone, the usual indentation
     state->fIndent = static_cast<int>(tokenStart - p);
     return;

@@ -7,12 +7,6 @@
 
 #include "core/growth.h"
 
-namespace {
-
-void Terminate(TextBuffer* buffer) { memset(buffer->fData + buffer->fLength, 0, kTextPadding); }
-
-}  // namespace
-
 void InitTextBuffer(TextBuffer* buffer) {
   memset(buffer->fInline, 0, kTextPadding);
   buffer->fData = buffer->fInline;

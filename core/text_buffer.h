@@ -27,6 +27,11 @@ void ResetTextBuffer(TextBuffer* buffer);
 // Python exception is set; the buffer is unchanged).
 int GrowTextBuffer(TextBuffer* buffer, size_t needed);
 
+// Zeroes the padding from the end of the text on.
+inline void Terminate(TextBuffer* buffer) {
+  memset(buffer->fData + buffer->fLength, 0, kTextPadding);
+}
+
 // Appends n bytes. Returns 0, or -1 when storage cannot be had (no Python exception is set;
 // the buffer is unchanged). Inline: every physical line read is appended.
 inline int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n) {
@@ -35,7 +40,7 @@ inline int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n) {
   if (needed > buffer->fCapacity && GrowTextBuffer(buffer, needed) != 0) return -1;
   memcpy(buffer->fData + buffer->fLength, bytes, n);
   buffer->fLength += n;
-  memset(buffer->fData + buffer->fLength, 0, kTextPadding);
+  Terminate(buffer);
   return 0;
 }
 

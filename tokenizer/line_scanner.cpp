@@ -2,8 +2,6 @@
 // line text, which holds every physical line of the logical line in one buffer.
 #include "tokenizer/line_scanner.h"
 
-#include <bit>
-#include <cstdint>
 #include <cstring>
 
 #include "core/token_ids.h"
@@ -25,16 +23,6 @@ int BackslashRun(const char* from, const char* before) {
     count++;
   }
   return count;
-}
-
-// Steps over the spaces at p, a word at a time: indentation is most of the blanks in source.
-const char* SkipSpaces(const char* p, const char* end) {
-  while (end - p >= 8) {
-    const uint64_t others = WordAt(p, 8) ^ 0x2020202020202020ull;  // zero bytes were spaces
-    if (others) return p + std::countr_zero(others) / 8;
-    p += 8;
-  }
-  return p;
 }
 
 // Steps over a name: its first character, then every character that may continue it. ASCII
@@ -124,7 +112,7 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
     // The line begins inside an open string; fStart stays on the line where it began.
     pos = ScanStringBody(state, cursor, pos);
   } else {
-    pos = SkipSpaces(pos, end);
+    pos = SkipSpaces(pos);
     while (IsBlank(Byte(pos))) pos++;  // stops at the zero byte after the text at the latest
     if (pos == end) {
       cursor->fPos = end;

@@ -65,6 +65,9 @@ inline uint64_t HeadWord(const char* p, Py_ssize_t n) {
   return word;
 }
 
+// The last eight of the n bytes at p as a word, or 0 for a text of eight bytes or fewer.
+inline uint64_t TailWord(const char* p, Py_ssize_t n) { return n > 8 ? WordAt(p + n - 8, 8) : 0; }
+
 // Mixes the first and last eight bytes (words as WordAt gives them; the last is 0 for a text of
 // eight bytes or fewer) and the length: enough to spread token texts over the slots of a cache,
 // at a fixed cost whatever the length.
@@ -75,5 +78,16 @@ inline uint32_t HashWords(uint64_t head, uint64_t tail, Py_ssize_t n) {
 }
 
 inline uint32_t HashText(const char* p, Py_ssize_t n) {
-  return HashWords(HeadWord(p, n), n > 8 ? WordAt(p + n - 8, 8) : 0, n);
+  return HashWords(HeadWord(p, n), TailWord(p, n), n);
+}
+
+// Returns the first byte at or after p that is no space, read a word at a time: indentation is
+// most of the blanks in source. A byte that is no space must lie within the text's storage past
+// p, as the zero byte after a TextBuffer's text does, and eight bytes must be readable at each
+// word up to it, as that buffer's padding allows.
+inline const char* SkipSpaces(const char* p) {
+  for (;; p += 8) {
+    const uint64_t others = WordAt(p, 8) ^ 0x2020202020202020ull;  // zero bytes were spaces
+    if (others) return p + std::countr_zero(others) / 8;
+  }
 }
