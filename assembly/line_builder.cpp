@@ -37,8 +37,8 @@ bool IsStatementKeyword(const TokenText& text) {
 
 bool LastTokenIsTrailingBackslash(const ReadingState* state) {
   const int last = state->fTokenCount - 1;
-  return TextOf(state, last).At(0) == '\\' && state->fTokenPositions[last].fLine ==
-                                                  static_cast<uint16_t>(state->fLineIndex);
+  return TextOf(state, last).At(0) == '\\' &&
+         state->fTokenPositions[last].fLine == state->fLineIndex;
 }
 
 bool AnyTokenIs(const ReadingState* state, int from, int to, std::string_view word) {

@@ -30,15 +30,15 @@ bool KeepToken(const ReadingState* state) {
 }
 
 // Measures the indentation: tabs advance to the next tab stop, blanks count one, form feeds
-// and vertical tabs count nothing. Counted modulo 2**31, so that an absurdly wide indentation
-// keeps its low 16 bits and never turns negative.
-void MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
+// and vertical tabs count nothing. Returns 0, or -1 with OverflowError set for an indentation
+// wider than an int holds, which only tabs can reach: the text itself is shorter than that.
+int MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
   if (SkipSpaces(p) == tokenStart) {
     state->fSpacesInIndent = tokenStart > p;  // spaces alone, the usual indentation
     state->fIndent = static_cast<int>(tokenStart - p);
-    return;
+    return 0;
   }
-  uint32_t column = 0;
+  uint64_t column = 0;
   for (; p < tokenStart; p++) {
     if (*p == '\t') {
       column += kTabWidth - column % kTabWidth;
@@ -48,7 +48,12 @@ void MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
       state->fSpacesInIndent = 1;
     }
   }
-  state->fIndent = static_cast<int>(column & INT_MAX);
+  if (column > INT_MAX) {
+    PyErr_SetString(PyExc_OverflowError, "Indentation does not fit in 32 bits");
+    return -1;
+  }
+  state->fIndent = static_cast<int>(column);
+  return 0;
 }
 
 // Makes room for one token more than the list holds, when it has none. Kept apart from the
@@ -81,7 +86,7 @@ void MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
   }
   state->fTokenArray[state->fTokenCount] = token;
   state->fTokenPositions[state->fTokenCount] =
-      TokenPosition{static_cast<uint16_t>(lineIndex), static_cast<uint16_t>(column)};
+      TokenPosition{.fLine = lineIndex, .fColumn = column};
   state->fTokenCount++;
   const unsigned first = TokenText(token).At(0);
   if (IsSignificant(first)) state->fSignificantCount++;
@@ -177,7 +182,7 @@ int TokenizePhysicalLine(ReadingState* state, int lineStart) {
     ScanNextToken(table, &state->fScan, &cursor);
     if (cursor.fAtEnd) return 0;
     if (measure) {  // at the first token, whatever it is, even one that is not listed
-      MeasureIndent(state, text + lineStart, text + state->fScan.fStart);
+      if (MeasureIndent(state, text + lineStart, text + state->fScan.fStart) != 0) return -1;
       measure = false;
     }
     if (!state->fScan.fComplete || !KeepToken(state)) continue;

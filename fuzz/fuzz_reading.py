@@ -83,7 +83,7 @@ HOOK = {"kind": 0, "depth": 0}
 def Hook(indent, first, count, tokens, positions, spaces, tabs, incomplete, text):
     assert type(tokens) is tuple and type(positions) is tuple and len(tokens) == len(positions)
     assert all(type(t) is bytes for t in tokens), tokens
-    assert all(0 <= line < 65536 and 0 <= col < 65536 for line, col in positions), positions
+    assert all(0 <= line < count and col >= 0 for line, col in positions), positions
     assert indent >= 0 and first >= 0 and count >= 1, (indent, first, count)
     assert text is None or type(text) is str
     kind = HOOK["kind"]
@@ -109,7 +109,7 @@ def CheckLine(line, with_hook):
     tokens = line.fTokens
     assert len(tokens) == line.fTokenCount >= 1
     for i, (text, position) in enumerate(tokens):
-        assert type(text) is str and 0 <= position[0] < 65536 and 0 <= position[1] < 65536
+        assert type(text) is str and 0 <= position[0] < line.fLineCount and position[1] >= 0
         assert 1 <= line.GetTokenType(i) <= 203
     line.fType, line.fNamesDefined, line.fLocalScopeName
 

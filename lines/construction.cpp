@@ -90,9 +90,9 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts, bool take) {
   }
   PyRef owner = PyRef::Steal(reinterpret_cast<PyObject*>(line));  // releases a half-built line
   FillStorage(line, parts, take);
-  line->fIndentLevel = static_cast<int16_t>(parts.fIndentLevel);
+  line->fIndentLevel = parts.fIndentLevel;
   line->fStoredFirstLine = parts.fFirstLine;
-  line->fLineCount = static_cast<int16_t>(parts.fLineCount);
+  line->fLineCount = parts.fLineCount;
   line->fStoredOffset = parts.fOffset;
   LineType type = kUnknown;
   if (ClassifyLogicalLine(line->fTokenArray, line->fTokenCount, &type, &line->fLocalScopeName) != 0)

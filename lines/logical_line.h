@@ -25,8 +25,8 @@ struct LogicalLine {
   PyObject** fTokenArray;          // fTokenCount owned bytes objects, in the storage
   TokenPosition* fTokenPositions;  // fTokenCount positions, in the storage
   int32_t fTokenCount;
-  int16_t fIndentLevel;
-  int16_t fLineCount;
+  int32_t fIndentLevel;
+  int32_t fLineCount;
   uint8_t fType;   // a line type value, 0 to 25
   uint8_t fFlags;  // LineFlag bits
   PyObject* fScopeName;        // owned, or null

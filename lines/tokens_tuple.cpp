@@ -50,7 +50,10 @@ struct alignas(64) EntrySet {
 constexpr uintptr_t kEntrySets = 4096;  // a power of two
 EntrySet gEntries[kEntrySets];
 
-uint32_t PositionKey(TokenPosition at) { return uint32_t{at.fLine} << 16 | at.fColumn; }
+// Only shared positions are keyed, which lie far below 65536 in both parts.
+uint32_t PositionKey(TokenPosition at) {
+  return static_cast<uint32_t>(at.fLine) << 16 | static_cast<uint32_t>(at.fColumn);
+}
 
 // Objects sit at multiples of 16 bytes: multiplying spreads the pair over every set.
 uintptr_t EntrySetOf(PyObject* token, uint32_t position) {
@@ -73,22 +76,25 @@ bool IsSharedPosition(TokenPosition position) {
   return position.fLine < kSharedLines && position.fColumn < kSharedColumns;
 }
 
-// Line indexes and columns are kept modulo 65536, so every int that a position can hold has a
-// place here: past the small ints that the interpreter shares itself, a long line or a long
-// logical line would otherwise make one for nearly every token.
-PyObject* gPositionInts[1 << 16];  // owned, made at first use
+// The ints of position parts below this are made once for the process: past the small ints
+// that the interpreter shares itself, a long line or a long logical line would otherwise make
+// one for nearly every token. Larger parts are rare enough to be made each time.
+constexpr int32_t kSharedInts = 1 << 16;
+PyObject* gPositionInts[kSharedInts];  // owned, made at first use
 
-// Returns a borrowed reference to the int of a position part, or nullptr with an exception.
-PyObject* PositionInt(uint16_t value) {
+// Returns a new reference to the int of a position part, or nullptr with an exception.
+PyObject* PositionInt(int32_t value) {
+  if (value >= kSharedInts) return PyLong_FromLong(value);
   PyObject*& known = gPositionInts[value];
   if (!known) known = PyLong_FromLong(value);
+  Py_XINCREF(known);
   return known;
 }
 
 PyObject* NewPosition(TokenPosition position) {
-  PyObject* row = PositionInt(position.fLine);
-  PyObject* column = row ? PositionInt(position.fColumn) : nullptr;
-  return column ? NewPair(row, column) : nullptr;
+  PyRef row = PyRef::Steal(PositionInt(position.fLine));
+  PyRef column = PyRef::Steal(row ? PositionInt(position.fColumn) : nullptr);
+  return column ? NewPair(row.Get(), column.Get()) : nullptr;
 }
 
 // Returns a borrowed reference to the shared tuple of a position (they live as long as the

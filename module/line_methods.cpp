@@ -104,7 +104,7 @@ PyObject* SetLineRange(PyObject* self, PyObject* args) {
   int count = 0;
   if (!PyArg_ParseTuple(args, "ii", &first, &count)) return nullptr;
   SetFirstLine(AsLine(self), first);
-  AsLine(self)->fLineCount = static_cast<int16_t>(count);  // keeps the low 16 bits
+  AsLine(self)->fLineCount = count;
   Py_RETURN_NONE;
 }
 

@@ -295,7 +295,7 @@ def build_logical_line(src, lineno, copy_strings, skip_whitespace_lines, remove_
     return dict(
         type=line_type, local_scope_name=name, first_line=first, line_count=lineno - first,
         indent=bld.indent, tabs=bld.tabs, spaces=bld.spaces, incomplete=int(is_open),
-        tokens=bld.tokens, positions=[(i & 0xFFFF, c & 0xFFFF) for i, c in bld.positions],
+        tokens=bld.tokens, positions=bld.positions,
         line_text=bld.text if include_line_text else None), lineno
 
 

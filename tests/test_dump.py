@@ -111,3 +111,12 @@ def test_memory_does_not_grow_with_the_file(tmp_path):
                               stdout=subprocess.DEVNULL, stderr=subprocess.PIPE)
         peak_kb.append(int(done.stderr))
     assert peak_kb[1] - peak_kb[0] < 10 * len(CLOSED) * (10000 - 2500) / 1024
+
+
+def test_a_line_longer_than_a_window_is_dumped_once(tmp_path, capsys):
+    path = tmp_path / "long.py"
+    path.write_bytes(b"x = [\n" + b"    1,\n" * 40000 + b"]\ny = 2\n")
+    _, out, _ = run(capsys, "--json", str(path))
+    records = [json.loads(record) for record in out.splitlines()]
+    assert [(record["first_line"], record["line_count"])
+            for record in records if "first_line" in record] == [(1, 40002), (40003, 1)]

@@ -68,7 +68,7 @@ def test_lists_keep_order_and_identity_and_release_their_objects():
 
 def test_setters():
     line, first, second = line_of(b"\tx = (1,\n"), object(), object()  # tabs, ended open
-    for start, count, read_back in [(-1, 3, (-1, 3)), (1, 70000, (1, 4464)), (1, 40000, (1, -25536))]:
+    for start, count, read_back in [(-1, 3, (-1, 3)), (1, 70000, (1, 70000)), (2, 2**31 - 1, (2, 2**31 - 1))]:
         line.SetLineRange(start, count)
         assert (line.fFirstLine, line.fLineCount) == read_back
     for value in ("x", 0, [1], [], None, 1):
@@ -110,7 +110,7 @@ def test_copy_shares_objects_and_owns_storage(make_copy):
     assert line.fArgNames == tuple(names) and len(line.fTypeEquivs) == 1
     assert dup.fArgNames == tuple(names + extra) and len(dup.fTypeEquivs) == 6
     assert len(dup.fArgTypeEquivs) == 1 and line_of(b"x\n", include_line_text=0).Copy().fLineText is None
-    for first, count in [(0, 0), (-1, 3), (5, -2), (0, 65536), (0, 40000)]:
+    for first, count in [(0, 0), (-1, 3), (5, -2), (0, -40000)]:
         line.SetLineRange(first, count)  # a range no line can have cannot be copied
         pytest.raises(SystemError, line.Copy)
     del dup, extra

@@ -1,6 +1,8 @@
 """Reading source into logical lines: token cutting, joining and hand-back, positions,
 indentation, line breaks, windows and limits. Every read is checked against the model too."""
 import io
+import subprocess
+import sys
 
 import pytest
 
@@ -97,21 +99,48 @@ def test_indentation_of_the_first_physical_line(source, indent, tabs, spaces):
     assert (line.fIndentLevel, line.fTabsInIndent, line.fSpacesInIndent) == (indent, tabs, spaces)
 
 
-def test_sixteen_bit_fields_wrap():  # too big for the model, which copies text per line
+# Sizes just past each limit that 16 bits would have set, with the value every field must hold:
+# (indent, line count, position of the last token). Too big for the model, which copies text
+# per line.
+@pytest.mark.parametrize("source, indent, line_count, last", [
+    ([b" " * 40000 + b"x = (\n", b"1)\n"], 40000, 2, (")", (1, 1))),           # indentation
+    ([b"\t" * 8200 + b"x\n"], 65600, 1, ("x", (0, 8200))),                   # tabs, 8 columns
+    ([b"x = 1" + b" " * 70000 + b"+ 2\n"], 0, 1, ("2", (0, 70007))),          # column
+    ([b"x = [\n"] + [b"    1,\n"] * 32766 + [b"]\n"], 0, 32768, ("]", (32767, 0))),  # line count
+    ([b"x = [\n"] + [b"    1,\n"] * 70000 + [b"]\n"], 0, 70002, ("]", (70001, 0))),  # line index
+    ([b"s = '''\n"] + [b"\n"] * 70000 + [b"''' + a\n"], 0, 70002, ("a", (70001, 6))),
+    ([b"y = 1 + \\\n"] * 66000 + [b"  2\n"], 0, 66001, ("2", (66000, 2))),  # trailing backslashes
+])
+def test_sizes_hold_their_true_values(source, indent, line_count, last):
     parser = logicalline.CreateLogicalLineParser()
+    data = b"".join(source) + b"z = 0\n"
+    lines = parser.GetLogicalLineListFromBuffer(data)
+    assert [line.fTokens for line in lines] == [  # the two paths agree on huge lines too
+        line.fTokens for line in parser.GetLogicalLineList(io.BytesIO(data).readline)]
+    (big, after) = lines
+    assert (big.fIndentLevel, big.fLineCount, big.fTokens[-1]) == (indent, line_count, last)
+    assert (after.fFirstLine, after.fLineCount) == (line_count, 1)  # no line is read twice
+    copied = big.Copy()
+    assert (copied.fIndentLevel, copied.fLineCount, copied.fTokens) == (
+        indent, line_count, big.fTokens)
+    hooked = subprocess.run([sys.executable, "-c", HOOK_SIZES], input=data, capture_output=True)
+    assert hooked.stdout.split() == [str(indent).encode(), str(line_count).encode(),
+                                     str(last[1]).replace(" ", "").encode()], hooked.stderr
 
-    def read(source):
-        data = b"".join(source) if isinstance(source, list) else source
-        lines = parser.GetLogicalLineListFromBuffer(data)
-        assert [line.fTokens for line in lines] == [  # the two paths agree on huge lines too
-            line.fTokens for line in parser.GetLogicalLineList(io.BytesIO(data).readline)]
-        return lines
-    (wide,) = read(b" " * 40000 + b"a = " + b"b" * 100000 + b" + c\n")
-    assert wide.fIndentLevel == 40000 - 65536 and wide.fTokens[-1] == ("c", (0, 140007 % 65536))
-    pytest.raises(SystemError, wide.Copy)  # an indentation that reads back negative
-    (tall,) = read([b"x = (\n"] + [b"1,\n"] * 69998 + [b")\n"])
-    assert tall.fLineCount == 70000 - 65536 and tall.fTokens[-1] == (")", (69999 % 65536, 0))
-    (deep,) = read(b"x = " + b"(" * 100000 + b")" * 100000 + b"\n")
+
+HOOK_SIZES = """
+import logicalline, sys
+logicalline.SetLogicalCreateFunction(lambda indent, first, count, tokens, positions, *rest:
+                                     (indent, count, positions[-1]))
+indent, count, position = logicalline.CreateLogicalLineParser().GetLogicalLineListFromBuffer(
+    sys.stdin.buffer.read())[0]
+print(indent, count, str(position).replace(" ", ""))
+"""
+
+
+def test_deep_brackets_read_as_one_line():
+    (deep,) = logicalline.CreateLogicalLineParser().GetLogicalLineListFromBuffer(
+        b"x = " + b"(" * 100000 + b")" * 100000 + b"\n")
     assert deep.fTokenCount == 200002 and deep.fType is logicalline.kAssignment
 
 
