@@ -138,6 +138,7 @@ void DetachLine(LogicalLine* line) {
   ShiftGroup& left = table->fGroups[line->fGroup];
   MoveLine(line, left.fLineShift, left.fByteShift);
   left.fMembers--;
+  table->fStale = true;  // the list it numbers no longer holds what the table says
   line->fShiftTable = nullptr;
   DropShiftTable(table);
 }

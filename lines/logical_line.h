@@ -70,7 +70,8 @@ void MoveLine(LogicalLine* line, int64_t lines, int64_t bytes);
 // must share none yet.
 void AttachLine(LogicalLine* line, ShiftTable* table, uint32_t group);
 
-// Takes the line out of the numbering it shares, if any, keeping its numbers.
+// Takes the line out of the numbering it shares, if any, keeping its numbers. The numbering is
+// no longer trusted until it is recorded again.
 void DetachLine(LogicalLine* line);
 
 // Returns a new record in the fresh state (no tokens, type kUnknown, fLocalScopeName None),

@@ -1,8 +1,16 @@
-// Numbering a list's lines in order.
+// Numbering a list's lines in order, and the record of the list that was numbered.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
 #include "lines/numbering.h"
+
+namespace {
+
+const void* const* ItemsOf(PyObject* list) {
+  return reinterpret_cast<const void* const*>(PySequence_Fast_ITEMS(list));
+}
+
+}  // namespace
 
 int NumberLine(ShiftTable* table, LogicalLine* line, size_t index) {
   if (index % kGroupLines == 0) {
@@ -17,7 +25,16 @@ int NumberLine(ShiftTable* table, LogicalLine* line, size_t index) {
   return 0;
 }
 
-void SealNumbering(ShiftTable* table, const void* list, size_t length) {
-  table->fList = list;
-  table->fListLength = length;
+int SealNumbering(ShiftTable* table, PyObject* list) {
+  const auto count = static_cast<size_t>(PyList_GET_SIZE(list));
+  if (ReserveItems(table, count) != 0) {
+    PyErr_NoMemory();
+    return -1;
+  }
+  RecordItems(table, list, ItemsOf(list), count);
+  return 0;
+}
+
+bool ListIsAsNumbered(const ShiftTable* table, PyObject* list) {
+  return ItemsAreRecorded(table, list, ItemsOf(list), static_cast<size_t>(PyList_GET_SIZE(list)));
 }

@@ -1,6 +1,11 @@
 // Numbering the lines of a list in order, in groups of neighbours that share one table: as a
-// full read builds the list, or when an update finds a list that is not numbered yet.
+// full read builds the list, or when an update regroups a list whose groups edits have split.
+// The table also records the list's items, so that an update can tell whether the host changed
+// the list since.
 #pragma once
+
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
 
 #include <cstddef>
 
@@ -14,5 +19,9 @@ constexpr size_t kGroupLines = 32;
 // table it shared. Returns 0, or -1 with MemoryError set and the line unchanged.
 int NumberLine(ShiftTable* table, LogicalLine* line, size_t index);
 
-// Records the list that `table` numbers, as it stands now.
-void SealNumbering(ShiftTable* table, const void* list, size_t length);
+// Records the list that `table` numbers, as it stands now. Returns 0, or -1 with MemoryError set.
+int SealNumbering(ShiftTable* table, PyObject* list);
+
+// True when the list is the one the table recorded and holds exactly the lines recorded for it,
+// in that order, and none of them has left the numbering since.
+bool ListIsAsNumbered(const ShiftTable* table, PyObject* list);

@@ -10,7 +10,8 @@ ShiftTable* NewShiftTable() {
   auto* table = static_cast<ShiftTable*>(malloc(sizeof(ShiftTable)));
   if (!table) return nullptr;
   *table = ShiftTable{.fRefs = 1, .fGroups = nullptr, .fOrder = nullptr, .fCount = 0,
-                      .fCapacity = 0, .fList = nullptr, .fListLength = 0};
+                      .fCapacity = 0, .fList = nullptr, .fItems = nullptr, .fItemCount = 0,
+                      .fItemCapacity = 0, .fStale = false};
   return table;
 }
 
@@ -20,6 +21,7 @@ void DropShiftTable(ShiftTable* table) {
   if (--table->fRefs > 0) return;
   free(table->fGroups);
   free(table->fOrder);
+  free(table->fItems);
   free(table);
 }
 
@@ -51,4 +53,21 @@ void ShiftGroupsFrom(ShiftTable* table, size_t position, int64_t lines, int64_t 
     group.fLineShift += lines;
     group.fByteShift += bytes;
   }
+}
+
+int ReserveItems(ShiftTable* table, size_t count) {
+  return Grow(&table->fItems, &table->fItemCapacity, count, 16);
+}
+
+void RecordItems(ShiftTable* table, const void* list, const void* const* items, size_t count) {
+  table->fList = list;
+  if (count) memcpy(table->fItems, items, count * sizeof(*items));
+  table->fItemCount = count;
+  table->fStale = false;
+}
+
+bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,
+                      size_t count) {
+  return !table->fStale && list == table->fList && count == table->fItemCount &&
+         (count == 0 || memcmp(items, table->fItems, count * sizeof(*items)) == 0);
 }

@@ -21,10 +21,17 @@ struct ShiftTable {
   uint32_t* fOrder;     // group ids, in the order of their lines in the list
   size_t fCount;        // groups made; ids run from 0 to fCount - 1
   size_t fCapacity;     // of fGroups and fOrder alike
-  // The list it numbers, and that list's length after its last update: compared only, to
-  // tell whether the list is still as the updates left it.
+  // The list it numbers and that list's items, as the last read or update left them, and
+  // whether a line has left the numbering since (released, numbered for another list, given
+  // another range). While no line has left, every recorded line is alive, so a list whose items
+  // are these pointers holds these very lines, numbered as the table says. The list is told by
+  // its address: a list that now has that address and these items is as good as the one read,
+  // its copy. Both are compared only.
   const void* fList;
-  size_t fListLength;
+  const void** fItems;
+  size_t fItemCount;
+  size_t fItemCapacity;
+  bool fStale;
 };
 
 // A new empty table with one hold, or nullptr when memory is short (no exception set).
@@ -45,3 +52,15 @@ uint32_t InsertGroup(ShiftTable* table, size_t position);
 
 // Moves every group from `position` in the order on.
 void ShiftGroupsFrom(ShiftTable* table, size_t position, int64_t lines, int64_t bytes);
+
+// Makes room to record `count` items, so that RecordItems cannot fail. Returns 0, or -1 when
+// memory is short (no exception set).
+int ReserveItems(ShiftTable* table, size_t count);
+
+// Records the list the table numbers and its items, as they stand now, and trusts them again.
+// Room must have been reserved.
+void RecordItems(ShiftTable* table, const void* list, const void* const* items, size_t count);
+
+// True when the list and its items are those recorded and no line has left the numbering since.
+bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,
+                      size_t count);

@@ -103,8 +103,11 @@ PyObject* SetLineRange(PyObject* self, PyObject* args) {
   int first = 0;
   int count = 0;
   if (!PyArg_ParseTuple(args, "ii", &first, &count)) return nullptr;
-  SetFirstLine(AsLine(self), first);
-  AsLine(self)->fLineCount = count;
+  LogicalLine* line = AsLine(self);
+  if (first == FirstLineOf(line) && count == line->fLineCount) Py_RETURN_NONE;
+  DetachLine(line);  // the list it is in no longer fits the text it was read from
+  SetFirstLine(line, first);
+  line->fLineCount = count;
   Py_RETURN_NONE;
 }
 

@@ -69,11 +69,10 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
       return PyErr_NoMemory();
     }
   }
-  const int status = ReadLines(&state, stop, list.Get(), table);
+  int status = ReadLines(&state, stop, list.Get(), table);
   ReleaseReadingState(&state);
   if (table) {
-    if (status == 0)
-      SealNumbering(table, list.Get(), static_cast<size_t>(PyList_GET_SIZE(list.Get())));
+    if (status == 0) status = SealNumbering(table, list.Get());
     DropShiftTable(table);
   }
   return status == 0 ? list.Release() : nullptr;

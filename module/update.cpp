@@ -101,54 +101,53 @@ int RefuseLines() {
   return -1;
 }
 
-// Builds a new table for the list, checking on the way that its items are our lines, in order,
-// without overlaps. Returns the table, with the caller's hold, or nullptr with an exception
-// set. A line joins the new table as soon as it is checked, which keeps its numbers: on a
-// refusal the lines before stay in it, and the next update builds the table again.
-ShiftTable* BuildTable(PyObject* lines) {
+int RefuseChangedList() {
+  PyErr_SetString(PyExc_ValueError,
+                  "the list was changed since it was read or last updated; read it again");
+  return -1;
+}
+
+// Numbers the list's lines afresh in a new table, regrouped in order. Returns the table, with
+// the caller's hold, or nullptr with MemoryError set and the lines as they were.
+ShiftTable* Regroup(PyObject* lines) {
+  const auto size = static_cast<size_t>(PyList_GET_SIZE(lines));
   ShiftTable* table = NewShiftTable();
-  if (!table) {
+  if (!table || ReserveGroups(table, size / kGroupLines + 1) != 0) {
+    if (table) DropShiftTable(table);
     PyErr_NoMemory();
     return nullptr;
   }
-  int64_t end = 0;
-  for (Py_ssize_t i = 0; i < PyList_GET_SIZE(lines); i++) {
-    LogicalLine* line = LineAt(lines, i);
-    const bool fits =
-        line && FirstLineOf(line) >= end && line->fLineCount >= 1 && OffsetOf(line) >= 0;
-    if (!fits) {
-      if (line) RefuseLines();
-      DropShiftTable(table);
-      return nullptr;
-    }
-    end = EndOf(line);
-    if (NumberLine(table, line, static_cast<size_t>(i)) != 0) {
-      DropShiftTable(table);
-      return nullptr;
-    }
+  for (size_t i = 0; i < size; i++)
+    NumberLine(table, AsLine(PyList_GET_ITEM(lines, i)), i);  // cannot fail: room is reserved
+  if (SealNumbering(table, lines) != 0) {
+    DropShiftTable(table);
+    return nullptr;
   }
   return table;
 }
 
-// The table that numbers the list, with a hold for the caller: the one its lines share, or a
-// new one when they share none yet, when the list is not as the last update left it, or when
-// edits have split its groups so finely that moving them would cost more than building it
-// again. Returns nullptr with an exception set.
+// The table that numbers the list, with a hold for the caller: the one its lines share, while
+// the list holds exactly what the last read or update left in it; regrouped when edits have
+// split its groups so finely that moving them would cost more than numbering them again. An
+// empty list gets a new table, and is read in full. A list changed since is refused: nothing
+// short of reading the text again would prove that its lines still fit it. Returns nullptr
+// with an exception set.
 ShiftTable* TableFor(PyObject* lines) {
   const Py_ssize_t size = PyList_GET_SIZE(lines);
-  if (size > 0) {
-    const LogicalLine* first = LineAt(lines, 0);
-    const LogicalLine* last = first ? LineAt(lines, size - 1) : nullptr;
-    if (!last) return nullptr;
-    ShiftTable* table = first->fShiftTable;
-    if (table && table == last->fShiftTable && table->fList == lines &&
-        table->fListLength == static_cast<size_t>(size) &&
-        table->fCount <= 2 * (static_cast<size_t>(size) / kGroupLines) + 64) {
-      HoldShiftTable(table);
-      return table;
-    }
+  if (size == 0) {
+    ShiftTable* table = NewShiftTable();
+    if (!table) PyErr_NoMemory();
+    return table;
   }
-  return BuildTable(lines);
+  const LogicalLine* first = LineIfOurs(lines, 0);
+  ShiftTable* table = first ? first->fShiftTable : nullptr;
+  if (!table || !ListIsAsNumbered(table, lines)) {
+    RefuseChangedList();
+    return nullptr;
+  }
+  if (table->fCount > 2 * (static_cast<size_t>(size) / kGroupLines) + 64) return Regroup(lines);
+  HoldShiftTable(table);
+  return table;
 }
 
 // Where physical line `number` starts, when the text up to it is as the lines were read: from
@@ -331,7 +330,9 @@ PyObject* UpdateNumbered(PyObject* parser, PyObject* lines, ShiftTable* table, c
   const Py_ssize_t count = PyList_GET_SIZE(added.Get());
   PyRef result = PyRef::Steal(Py_BuildValue("nnO", index, kept - index, added.Get()));
   if (!result) return nullptr;
-  if (ReserveGroups(table, ReservedGroups(count)) != 0) return PyErr_NoMemory();
+  if (ReserveGroups(table, ReservedGroups(count)) != 0 ||
+      ReserveItems(table, static_cast<size_t>(size - (kept - index) + count)) != 0)
+    return PyErr_NoMemory();
   // The old lines stay alive until the list is renumbered: releasing them may run a host's
   // code, which must find the list whole.
   PyRef removed = PyRef::Steal(PyList_GetSlice(lines, index, kept));
@@ -340,7 +341,7 @@ PyObject* UpdateNumbered(PyObject* parser, PyObject* lines, ShiftTable* table, c
     if (LogicalLine* line = LineIfOurs(removed.Get(), i)) DetachLine(line);
   }
   Renumber(lines, table, index, count, edit.Delta(), byteDelta);
-  SealNumbering(table, lines, static_cast<size_t>(PyList_GET_SIZE(lines)));
+  SealNumbering(table, lines);  // cannot fail: room is reserved
   return result.Release();
 }
 
@@ -348,9 +349,21 @@ PyObject* UpdateNumbered(PyObject* parser, PyObject* lines, ShiftTable* table, c
 // with an exception set and `lines` unchanged.
 PyObject* Update(PyObject* parser, PyObject* lines, const Edit& edit, const char* data,
                  const char* end) {
+  Edit whole = edit;
+  if (PyList_GET_SIZE(lines) == 0) {
+    // An empty list proves nothing about the text it came from: the new text is read in full,
+    // as an edit of all of it.
+    int64_t total = 0;
+    SkipLines(data, end, INT64_MAX, &total);
+    if (edit.fFirst + edit.fNewCount > total) {
+      PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
+      return nullptr;
+    }
+    whole = Edit{.fFirst = 0, .fOldCount = 0, .fNewCount = total};
+  }
   ShiftTable* table = TableFor(lines);
   if (!table) return nullptr;
-  PyObject* result = UpdateNumbered(parser, lines, table, edit, data, end);
+  PyObject* result = UpdateNumbered(parser, lines, table, whole, data, end);
   DropShiftTable(table);
   return result;
 }
