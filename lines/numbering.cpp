@@ -35,6 +35,11 @@ int SealNumbering(ShiftTable* table, PyObject* list) {
   return 0;
 }
 
+void SealReplacedLines(ShiftTable* table, PyObject* list, size_t index, size_t removed,
+                       size_t added) {
+  RecordReplacedItems(table, list, index, removed, ItemsOf(list) + index, added);
+}
+
 bool ListIsAsNumbered(const ShiftTable* table, PyObject* list) {
   return ItemsAreRecorded(table, list, ItemsOf(list), static_cast<size_t>(PyList_GET_SIZE(list)));
 }

@@ -22,6 +22,11 @@ int NumberLine(ShiftTable* table, LogicalLine* line, size_t index);
 // Records the list that `table` numbers, as it stands now. Returns 0, or -1 with MemoryError set.
 int SealNumbering(ShiftTable* table, PyObject* list);
 
+// Records that the list's slice from `index` on, `removed` lines, became the `added` lines that
+// the list now holds there. Room for the list's new length must have been reserved.
+void SealReplacedLines(ShiftTable* table, PyObject* list, size_t index, size_t removed,
+                       size_t added);
+
 // True when the list is the one the table recorded and holds exactly the lines recorded for it,
 // in that order, and none of them has left the numbering since.
 bool ListIsAsNumbered(const ShiftTable* table, PyObject* list);

@@ -66,6 +66,17 @@ void RecordItems(ShiftTable* table, const void* list, const void* const* items, 
   table->fStale = false;
 }
 
+void RecordReplacedItems(ShiftTable* table, const void* list, size_t index, size_t removed,
+                         const void* const* items, size_t added) {
+  table->fList = list;
+  const void** at = table->fItems + index;
+  const size_t after = table->fItemCount - index - removed;
+  if (added != removed) memmove(at + added, at + removed, after * sizeof(*at));
+  if (added) memcpy(at, items, added * sizeof(*at));
+  table->fItemCount += added - removed;
+  table->fStale = false;
+}
+
 bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,
                       size_t count) {
   return !table->fStale && list == table->fList && count == table->fItemCount &&

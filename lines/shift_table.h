@@ -61,6 +61,11 @@ int ReserveItems(ShiftTable* table, size_t count);
 // Room must have been reserved.
 void RecordItems(ShiftTable* table, const void* list, const void* const* items, size_t count);
 
+// Records that the list's items from `index` on, `removed` of them, were replaced by the
+// `added` items at `items`, and trusts the record again. Room must have been reserved.
+void RecordReplacedItems(ShiftTable* table, const void* list, size_t index, size_t removed,
+                         const void* const* items, size_t added);
+
 // True when the list and its items are those recorded and no line has left the numbering since.
 bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,
                       size_t count);

@@ -341,7 +341,8 @@ PyObject* UpdateNumbered(PyObject* parser, PyObject* lines, ShiftTable* table, c
     if (LogicalLine* line = LineIfOurs(removed.Get(), i)) DetachLine(line);
   }
   Renumber(lines, table, index, count, edit.Delta(), byteDelta);
-  SealNumbering(table, lines);  // cannot fail: room is reserved
+  SealReplacedLines(table, lines, static_cast<size_t>(index), static_cast<size_t>(kept - index),
+                    static_cast<size_t>(count));
   return result.Release();
 }
 
