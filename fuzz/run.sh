@@ -71,7 +71,7 @@ for i, path in enumerate(paths):
     seeds = {"reading": bytes([rng.randrange(48), 0, 0, 0]) + source,
              "reading-hook": bytes([rng.randrange(48), 0, 0, rng.randrange(40)]) + source,
              "lines": bytes([rng.randrange(16), 24]) + source + rng.randbytes(48),
-             "update": bytes([rng.randrange(16)]) + source + b"\xff\xfe" + rng.randbytes(30)}
+             "update": bytes([rng.randrange(16)]) + source[:1536] + b"\xff\xfe" + rng.randbytes(32)}
     for target, seed in seeds.items():
         with open(os.path.join(sys.argv[1], target, "%04d" % i), "wb") as f:
             f.write(seed)

@@ -82,8 +82,8 @@ class LogicalLine:
     def fBaseClassNames(self) -> tuple[object, ...]: ...
     @property
     def fLocalScopeName(self) -> str | None: ...
-    # (text, (line index within the logical line, column in bytes)) per token; the position
-    # is None on a line that carries no positions.
+    # (text, (line index within the logical line, column in bytes)) per token, true values at
+    # any size; the position is None on a line that carries no positions.
     @property
     def fTokens(self) -> tuple[tuple[str, tuple[int, int] | None], ...]: ...
     @property
@@ -122,6 +122,8 @@ class LogicalLineParser:
     # new_count lines, makes `lines` (a full read of the old text by this parser) what a full
     # read of `data` gives, re-reading only what the edit touched. Returns (index, removed,
     # added): lines[index:index + len(added)] is added, in place of `removed` old lines.
+    # Raises ValueError, leaving `lines` as it was, for an edit outside the text or a list
+    # that is not exactly as the read or the last update left it (read the text again then).
     def UpdateLogicalLineList(
         self, lines: list[LogicalLine], data: Buffer, first_line: int, old_count: int,
         new_count: int, /
