@@ -5,8 +5,11 @@
 #include "assembly/reading_state.h"
 
 #include <cstdlib>
+#include <cstring>
 
 #include "core/growth.h"
+
+namespace {
 
 void InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
                       const char* data, const char* dataEnd, int64_t firstLine) {
@@ -30,6 +33,23 @@ void InitReadingState(ReadingState* state, const ReadOptions& options, PyObject*
   state->fLineStarts = state->fInlineLineStarts;
   state->fLineStartCapacity = kInlineLineStarts;
   StartLogicalLine(state);
+}
+
+}  // namespace
+
+void InitReadlineReading(ReadingState* state, const ReadOptions& options, PyObject* readline,
+                         int64_t firstLine) {
+  InitReadingState(state, options, readline, nullptr, nullptr, firstLine);
+}
+
+void InitBufferReading(ReadingState* state, const ReadOptions& options, const char* data,
+                       const char* from, const char* dataEnd, int64_t firstLine, bool whole) {
+  InitReadingState(state, options, nullptr, from, dataEnd, firstLine);
+  state->fAtStart = from == data;
+  state->fSourceOffset = from - data;
+  // A whole buffer without a NUL byte, the usual case, needs no search of every line for one;
+  // a read that may stop early searches line by line, never past where it stops.
+  if (whole) state->fMayHoldNul = memchr(from, '\0', static_cast<size_t>(dataEnd - from)) != nullptr;
 }
 
 void StartLogicalLine(ReadingState* state) {

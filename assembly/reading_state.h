@@ -48,10 +48,16 @@ struct ReadingState {
   int fInlineLineStarts[kInlineLineStarts];
 };
 
-// Sets up a call's state, reading through readline, or from [data, dataEnd) when readline is
-// null.
-void InitReadingState(ReadingState* state, const ReadOptions& options, PyObject* readline,
-                     const char* data, const char* dataEnd, int64_t firstLine);
+// Sets up a call's state for reading through readline, numbering from firstLine.
+void InitReadlineReading(ReadingState* state, const ReadOptions& options, PyObject* readline,
+                         int64_t firstLine);
+
+// Sets up a call's state for reading a buffer [data, dataEnd) from `from`, the start of the
+// physical line numbered firstLine: offsets count from data, and a byte-order mark is skipped
+// only at data itself. With `whole`, the rest of the buffer is searched for a NUL byte once,
+// rather than line by line.
+void InitBufferReading(ReadingState* state, const ReadOptions& options, const char* data,
+                       const char* from, const char* dataEnd, int64_t firstLine, bool whole);
 
 // Releases every reference and block the state holds.
 void ReleaseReadingState(ReadingState* state);

@@ -24,7 +24,7 @@ PyObject* CopyLogicalLine(LogicalLine* source) {
                            .fIncomplete = (source->fFlags & kIncompleteFlag) != 0,
                            .fLineText = text,
                            .fLineTextLength = text ? strlen(text) : 0,
-                           .fOffset = OffsetOf(source)};
+                           .fOffset = SourceOffsetOf(source)};
   PyRef copy = PyRef::Steal(CreateNativeLogicalLine(parts));
   if (!copy) return nullptr;
   LogicalLine* line = AsLine(copy.Get());

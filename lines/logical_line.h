@@ -38,7 +38,7 @@ struct LogicalLine {
   PyObject* fLocalScopeName;   // the defined name on a class or function line, else None
   // Where the line starts: its first physical line, and that line's offset in the text read.
   // Both are stored less the shift of its group when it shares the numbering of an updated
-  // list; read them with FirstLineOf and OffsetOf.
+  // list; read them with FirstLineOf and SourceOffsetOf.
   int64_t fStoredFirstLine;
   int64_t fStoredOffset;
   ShiftTable* fShiftTable;  // a hold on the numbering it shares, or null
@@ -55,7 +55,7 @@ inline int64_t FirstLineOf(const LogicalLine* line) {
   return line->fStoredFirstLine + (table ? table->fGroups[line->fGroup].fLineShift : 0);
 }
 
-inline int64_t OffsetOf(const LogicalLine* line) {
+inline int64_t SourceOffsetOf(const LogicalLine* line) {
   const ShiftTable* table = line->fShiftTable;
   return line->fStoredOffset + (table ? table->fGroups[line->fGroup].fByteShift : 0);
 }
