@@ -26,7 +26,7 @@ assert calls == [(8, 5, 1, (b"f", b"(", b"1", b","), ((0, 1), (0, 2), (0, 3), (0
 copied = plain.Copy()  # a copy bypasses the hook
 assert type(copied) is logicalline.LogicalLineType and copied.fArgNames == ("a",)
 logicalline.SetLogicalCreateFunction(lambda *parts: parts[0] if parts[0] else None)
-assert read(b" " * 40000 + b"x\ny\n") == [40000]  # no 16-bit limit here, and None is dropped
+assert read(b" " * 40000 + b"x\ny\n") == [40000]  # None is dropped
 ''', "failures": r'''
 calls = []
 def hook(*parts):
@@ -64,6 +64,15 @@ change = mapped.close
 assert PARSER.GetLogicalLineListFromBuffer(mapped, 7) == [7, 8, 9, 10]
 data.extend(b"w\n")  # free again once the call is over
 mapped.close()
+''', "a hook installed halfway through a read": r'''
+source = io.BytesIO(b"x = 1\ny = 2\nz = 3\n")
+def readline():
+    if source.tell() == 6:  # after the first line: the rest are the hook's
+        logicalline.SetLogicalCreateFunction(lambda *parts: parts[1])
+    return source.readline()
+first, *rest = PARSER.GetLogicalLineList(readline)
+assert type(first) is logicalline.LogicalLineType and rest == [1, 2]
+assert outcome(PARSER.UpdateLogicalLineList, [first] + rest, b"x\n", 0, 1, 1) == "TypeError"
 '''}
 
 
