@@ -31,3 +31,6 @@ PyObject* CachedFixedText(int id);
 
 // Stores the fixed text that stands for a token id; returns a new reference to it.
 PyObject* StoreFixedText(int id, const char* text);
+
+// Empties the token text table and the fixed texts.
+void ReleaseTokenTexts();

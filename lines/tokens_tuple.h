@@ -12,3 +12,6 @@ PyObject* PositionTuple(TokenPosition position);
 
 // Returns the line's fTokens tuple, built at the first call and the same object after.
 PyObject* LineTokens(LogicalLine* line);
+
+// Empties every table that reading shares: the entries and parts of fTokens, the token texts.
+void ReleaseSharedTables();

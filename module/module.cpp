@@ -1,11 +1,12 @@
 // The module: its functions, their table, and initialisation. State lives in process-wide
-// variables (the line type constants and the create hook), so the module is initialised once
-// per process.
+// variables (the line type constants, the create hook, and the tables that reads share), so the
+// module is initialised once per process.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
 #include "lines/construction.h"
 #include "lines/logical_line.h"
+#include "lines/tokens_tuple.h"
 #include "logicalline_direct.h"
 #include "module/constants.h"
 #include "module/direct_table.h"
@@ -79,6 +80,16 @@ PyObject* SetLogicalCreateFunction(PyObject*, PyObject* args) {
   Py_RETURN_NONE;
 }
 
+PyDoc_STRVAR(kReleaseSharedTablesDoc,
+             "Empty the tables of token texts and fTokens entries that reads share, as when the "
+             "module is freed.  For leak checks: what reading holds can then be counted.");
+PyObject* ReleaseSharedTablesFunction(PyObject*, PyObject*) {
+  ReleaseSharedTables();
+  Py_RETURN_NONE;
+}
+
+void FreeModule(void*) { ReleaseSharedTables(); }
+
 PyMethodDef kModuleFunctions[] = {
     {"CreateLogicalLineParser", AsMethod(CreateLogicalLineParser), METH_VARARGS | METH_KEYWORDS,
      kCreateLogicalLineParserDoc},
@@ -87,12 +98,14 @@ PyMethodDef kModuleFunctions[] = {
     {"GetIdForTokenStart", GetIdForTokenStart, METH_VARARGS, kGetIdForTokenStartDoc},
     {"_GetFirstCodeUnit", GetFirstCodeUnit, METH_VARARGS, nullptr},
     {"SetLogicalCreateFunction", SetLogicalCreateFunction, METH_VARARGS, nullptr},
+    {"_ReleaseSharedTables", ReleaseSharedTablesFunction, METH_NOARGS, kReleaseSharedTablesDoc},
     {nullptr, nullptr, 0, nullptr},
 };
 
+// The tables are released when the module is freed, if the interpreter frees it.
 PyModuleDef kModuleDef = {
     PyModuleDef_HEAD_INIT, "logicalline", nullptr, -1, kModuleFunctions,
-    nullptr, nullptr, nullptr, nullptr,
+    nullptr, nullptr, nullptr, FreeModule,
 };
 
 }  // namespace
