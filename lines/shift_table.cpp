@@ -10,7 +10,7 @@ ShiftTable* NewShiftTable() {
   auto* table = static_cast<ShiftTable*>(malloc(sizeof(ShiftTable)));
   if (!table) return nullptr;
   *table = ShiftTable{.fRefs = 1, .fGroups = nullptr, .fOrder = nullptr, .fCount = 0,
-                      .fCapacity = 0, .fList = nullptr, .fItems = nullptr, .fItemCount = 0,
+                      .fGroupCapacity = 0, .fOrderCapacity = 0, .fList = nullptr, .fItems = nullptr, .fItemCount = 0,
                       .fItemCapacity = 0, .fStale = false};
   return table;
 }
@@ -28,10 +28,8 @@ void DropShiftTable(ShiftTable* table) {
 int ReserveGroups(ShiftTable* table, size_t more) {
   const size_t needed = table->fCount + more;
   if (needed > UINT32_MAX) return -1;
-  size_t orderCapacity = table->fCapacity;
-  // The order first: if the groups cannot grow, the capacity still holds for both.
-  if (Grow(&table->fOrder, &orderCapacity, needed, 16) != 0) return -1;
-  return Grow(&table->fGroups, &table->fCapacity, needed, 16);
+  if (Grow(&table->fOrder, &table->fOrderCapacity, needed, 16) != 0) return -1;
+  return Grow(&table->fGroups, &table->fGroupCapacity, needed, 16);
 }
 
 uint32_t InsertGroup(ShiftTable* table, size_t position) {

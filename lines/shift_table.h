@@ -20,7 +20,8 @@ struct ShiftTable {
   ShiftGroup* fGroups;  // by group id
   uint32_t* fOrder;     // group ids, in the order of their lines in the list
   size_t fCount;        // groups made; ids run from 0 to fCount - 1
-  size_t fCapacity;     // of fGroups and fOrder alike
+  size_t fGroupCapacity;
+  size_t fOrderCapacity;
   // The list it numbers and that list's items, as the last read or update left them, and
   // whether a line has left the numbering since (released, numbered for another list, given
   // another range). While no line has left, every recorded line is alive, so a list whose items
