@@ -67,8 +67,7 @@ void StartLogicalLine(ReadingState* state) {
 
 void ReleaseReadingState(ReadingState* state) {
   StartLogicalLine(state);
-  free(state->fTokenArray);
-  free(state->fTokenPositions);
+  free(state->fTokenArray);  // the positions share its block
   if (state->fLineStarts != state->fInlineLineStarts) free(state->fLineStarts);
   ResetTextBuffer(&state->fText);
   ResetTextBuffer(&state->fPending);

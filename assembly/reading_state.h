@@ -33,7 +33,9 @@ struct ReadingState {
   // The logical line being built.
   TextBuffer fText;      // every physical line read for it, line breaks included
   ScanState fScan;       // carried from one physical line to the next
-  PyObject** fTokenArray;  // fTokenCount owned references
+  // One block: fTokenCapacity references, of which fTokenCount are owned, then as many
+  // positions, fTokenPositions pointing at the first.
+  PyObject** fTokenArray;
   TokenPosition* fTokenPositions;
   int fTokenCount;
   size_t fTokenCapacity;

@@ -13,9 +13,9 @@
 
 constexpr Py_ssize_t kCachedTextLimit = 40;  // longer texts are rarely repeated
 
-// Returns a new reference to a bytes object holding the n bytes at p, which lie in a text with
-// the padding of a TextBuffer after it. Shared texts stay in a table for the life of the process
-// until another text takes their place.
+// Returns a new reference to a bytes object holding the n bytes at p, which lie in the text of a
+// TextBuffer, so that a whole word may be read at p. Shared texts stay in a table until another
+// text takes their place.
 PyObject* CachedBytes(const char* p, Py_ssize_t n);
 
 // The fixed texts: operators' canonical texts and the string placeholder, one bytes object per

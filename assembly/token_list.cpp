@@ -7,10 +7,10 @@
 
 #include <climits>
 #include <cstdint>
+#include <cstdlib>
 #include <cstring>
 
 #include "assembly/token_cache.h"
-#include "core/growth.h"
 #include "core/token_ids.h"
 #include "tokenizer/line_scanner.h"
 #include "tokenizer/token_text.h"
@@ -56,22 +56,31 @@ int MeasureIndent(ReadingState* state, const char* p, const char* tokenStart) {
   return 0;
 }
 
-// Makes room for one token more than the list holds, when it has none. Kept apart from the
-// append, which runs for every token, so that the append stays small enough to inline.
-// Returns 0, or -1 with an exception set.
+// Makes room for one token more than the list holds, when it has none: the references and the
+// positions share one block, fTokenCapacity references and then as many positions, so a single
+// capacity holds for both. Kept apart from the append, which runs for every token, so that the
+// append stays small enough to inline. Returns 0, or -1 with an exception set and the list as
+// it was.
 [[gnu::noinline]] int GrowTokens(ReadingState* state) {
   if (state->fTokenCount == INT_MAX) {
     PyErr_SetString(PyExc_ValueError, "Too many tokens in line");
     return -1;
   }
-  const size_t needed = static_cast<size_t>(state->fTokenCount) + 1;
-  size_t positions = state->fTokenCapacity;
-  // Positions first: if the tokens cannot grow, the capacity still holds for both.
-  if (Grow(&state->fTokenPositions, &positions, needed, 16) != 0 ||
-      Grow(&state->fTokenArray, &state->fTokenCapacity, needed, 16) != 0) {
+  constexpr size_t kEntry = sizeof(PyObject*) + sizeof(TokenPosition);
+  const size_t capacity = state->fTokenCapacity;
+  const size_t grown = capacity < 8 ? 16 : 2 * capacity;  // far below SIZE_MAX / kEntry
+  char* block = static_cast<char*>(realloc(state->fTokenArray, grown * kEntry));
+  if (!block) {
     PyErr_NoMemory();
     return -1;
   }
+  // The positions move up behind the longer array of references.
+  auto* positions = reinterpret_cast<TokenPosition*>(block + grown * sizeof(PyObject*));
+  memmove(positions, block + capacity * sizeof(PyObject*),
+          static_cast<size_t>(state->fTokenCount) * sizeof(TokenPosition));
+  state->fTokenArray = reinterpret_cast<PyObject**>(block);
+  state->fTokenPositions = positions;
+  state->fTokenCapacity = grown;
   return 0;
 }
 

@@ -2,6 +2,7 @@
 // length, because growth at least doubles the capacity.
 #include "core/text_buffer.h"
 
+#include <cstdint>
 #include <cstdlib>
 #include <cstring>
 
@@ -19,8 +20,10 @@ void ResetTextBuffer(TextBuffer* buffer) {
   InitTextBuffer(buffer);
 }
 
-int GrowTextBuffer(TextBuffer* buffer, size_t needed) {
-  return Grow(&buffer->fData, &buffer->fCapacity, needed, kInlineTextSize, buffer->fInline);
+int GrowTextBuffer(TextBuffer* buffer, size_t length) {
+  if (length > SIZE_MAX - kTextPadding) return -1;
+  return Grow(&buffer->fData, &buffer->fCapacity, length + kTextPadding, kInlineTextSize,
+              buffer->fInline);
 }
 
 void TruncateText(TextBuffer* buffer, size_t length) {

@@ -6,9 +6,12 @@
 #include <cstring>
 
 constexpr size_t kInlineTextSize = 160;
-// Zero bytes kept after the text, its terminating NUL first: a scanner may load a whole
-// 8-byte word at any offset of the text without reading past the storage.
+// Zero bytes kept after the text, its terminating NUL first: a scanner may load a whole word of
+// kTextPadding bytes at any offset of the text without reading past the storage, and a run of
+// name characters or blanks ends at the first of them. Every storage the buffer uses, inline or
+// grown, holds the text and this padding: GrowTextBuffer adds it, and only it makes storage.
 constexpr size_t kTextPadding = 8;
+static_assert(kInlineTextSize > kTextPadding, "the inline storage holds the padding");
 
 struct TextBuffer {
   char fInline[kInlineTextSize];
@@ -23,9 +26,9 @@ void InitTextBuffer(TextBuffer* buffer);
 // Frees the heap block, if any, and puts the buffer into the fresh state.
 void ResetTextBuffer(TextBuffer* buffer);
 
-// Makes room for `needed` bytes of storage. Returns 0, or -1 when storage cannot be had (no
-// Python exception is set; the buffer is unchanged).
-int GrowTextBuffer(TextBuffer* buffer, size_t needed);
+// Makes room for `length` bytes of text and the padding after them. Returns 0, or -1 when
+// storage cannot be had (no Python exception is set; the buffer is unchanged).
+int GrowTextBuffer(TextBuffer* buffer, size_t length);
 
 // Zeroes the padding from the end of the text on.
 inline void Terminate(TextBuffer* buffer) {
@@ -36,8 +39,8 @@ inline void Terminate(TextBuffer* buffer) {
 // the buffer is unchanged). Inline: every physical line read is appended.
 inline int AppendBytes(TextBuffer* buffer, const char* bytes, size_t n) {
   if (n == 0) return 0;
-  const size_t needed = buffer->fLength + n + kTextPadding;
-  if (needed > buffer->fCapacity && GrowTextBuffer(buffer, needed) != 0) return -1;
+  const size_t length = buffer->fLength + n;
+  if (length + kTextPadding > buffer->fCapacity && GrowTextBuffer(buffer, length) != 0) return -1;
   memcpy(buffer->fData + buffer->fLength, bytes, n);
   buffer->fLength += n;
   Terminate(buffer);

@@ -26,7 +26,7 @@ int BackslashRun(const char* from, const char* before) {
 }
 
 // Steps over a name: its first character, then every character that may continue it. ASCII
-// needs no decoding, and no bounds check: the zero byte after the text is no name character.
+// needs no decoding, and no bounds check: the text buffer's zero padding is no name character.
 const char* ScanName(const char* p, const char* end) {
   p += StepOverChar(p, end);
   for (;;) {
@@ -113,7 +113,7 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
     pos = ScanStringBody(state, cursor, pos);
   } else {
     pos = SkipSpaces(pos);
-    while (IsBlank(Byte(pos))) pos++;  // stops at the zero byte after the text at the latest
+    while (IsBlank(Byte(pos))) pos++;  // stops at the text buffer's zero padding at the latest
     if (pos == end) {
       cursor->fPos = end;
       cursor->fAtEnd = 1;

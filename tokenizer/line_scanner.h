@@ -16,7 +16,7 @@ struct ScanCursor {
 
 // Scans the next token into the state and moves the cursor past it, or sets fAtEnd. A token
 // left with fComplete 0 is a string that continues on the next physical line. The line is the
-// last of the text, and a zero byte follows it, as a TextBuffer keeps one.
+// last of the text, which lies in a TextBuffer and so is followed by its zero padding.
 void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cursor);
 
 // Scans a string body from `from` to its closing quote or the end of the line; returns where

@@ -10,6 +10,7 @@
 #include <cstring>
 #include <string_view>
 
+#include "core/text_buffer.h"
 #include "core/token_ids.h"
 
 struct TokenText {
@@ -82,9 +83,9 @@ inline uint32_t HashText(const char* p, Py_ssize_t n) {
 }
 
 // Returns the first byte at or after p that is no space, read a word at a time: indentation is
-// most of the blanks in source. A byte that is no space must lie within the text's storage past
-// p, as the zero byte after a TextBuffer's text does, and eight bytes must be readable at each
-// word up to it, as that buffer's padding allows.
+// most of the blanks in source. p lies in a TextBuffer's text, whose padding ends every run of
+// spaces and lets a word be read at each step up to it.
+static_assert(kTextPadding >= sizeof(uint64_t), "a word read at the text's last byte stays in it");
 inline const char* SkipSpaces(const char* p) {
   for (;; p += 8) {
     const uint64_t others = WordAt(p, 8) ^ 0x2020202020202020ull;  // zero bytes were spaces
