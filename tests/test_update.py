@@ -206,3 +206,10 @@ def test_an_edit_inside_a_line_of_many_physical_lines():
     lines = PARSER.GetLogicalLineListFromBuffer(b"".join(doc))
     doc = edit(doc, lines, 20000, 1, [b"    2,\n", b"    3,\n"])
     assert [(line.fFirstLine, line.fLineCount) for line in lines] == [(0, 40003), (40003, 1)]
+
+
+def test_an_empty_list_is_read_in_full():  # it proves nothing of the text it came from
+    lines, text = [], b"x = 1\ny = (2,\n 3)\n"
+    assert PARSER.UpdateLogicalLineList(lines, text, 1, 1, 1)[:2] == (0, 0)
+    assert view(lines) == view(PARSER.GetLogicalLineListFromBuffer(text))
+    pytest.raises(ValueError, PARSER.UpdateLogicalLineList, [], text, 2, 0, 2)  # past the text
