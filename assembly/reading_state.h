@@ -12,6 +12,7 @@
 #include "assembly/line_parts.h"
 #include "core/text_buffer.h"
 #include "core/token_position.h"
+#include "tokenizer/formatted_string.h"
 #include "tokenizer/token_start.h"
 
 constexpr int kInlineLineStarts = 8;
@@ -33,6 +34,7 @@ struct ReadingState {
   // The logical line being built.
   TextBuffer fText;      // every physical line read for it, line breaks included
   ScanState fScan;       // carried from one physical line to the next
+  FormattedStrings fStrings;  // the formatted strings open in fScan's string, when it is one
   PyObject** fTokenArray;  // fTokenCount owned references
   TokenPosition* fTokenPositions;
   int fTokenCount;

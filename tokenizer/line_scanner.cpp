@@ -47,6 +47,8 @@ bool IsNumberSuffixLetter(unsigned b) {
 
 }  // namespace
 
+const char* ScanNameEnd(const char* p, const char* end) { return ScanName(p, end); }
+
 const char* ScanNumber(const char* p, const char* end) {
   p++;  // a digit, or a dot before a digit
   for (; p < end; p++) {
