@@ -34,7 +34,6 @@ struct ReadingState {
   // The logical line being built.
   TextBuffer fText;      // every physical line read for it, line breaks included
   ScanState fScan;       // carried from one physical line to the next
-  FormattedStrings fStrings;  // the formatted strings open in fScan's string, when it is one
   PyObject** fTokenArray;  // fTokenCount owned references
   TokenPosition* fTokenPositions;
   int fTokenCount;
@@ -48,6 +47,7 @@ struct ReadingState {
   int* fLineStarts;       // offset in fText of each physical line 0..fLineIndex
   size_t fLineStartCapacity;
   int fInlineLineStarts[kInlineLineStarts];
+  FormattedStrings fStrings;  // the formatted strings open in fScan's string, when it is one
 };
 
 // Sets up a call's state, reading through readline, or from [data, dataEnd) when readline is

@@ -181,12 +181,16 @@ int TokenizePhysicalLine(ReadingState* state, int lineStart) {
   }
   bool measure = state->fLineIndex == 0;
   for (;;) {
-    if (strings) {
-      ScanNextTokenNested(table, &state->fScan, &cursor, strings);
+    // The cursor goes by value, so that the classic loop keeps it in registers.
+    const char* formattedEnd = nullptr;
+    if (strings && MayScanFormatted(&state->fScan, cursor.fPos)) [[unlikely]]
+      formattedEnd = ScanFormattedToken(&state->fScan, cursor, strings);
+    if (formattedEnd) [[unlikely]] {
+      cursor.fPos = formattedEnd;
     } else {
       ScanNextToken(table, &state->fScan, &cursor);
+      if (cursor.fAtEnd) return 0;
     }
-    if (cursor.fAtEnd) return 0;
     if (measure) {  // at the first token, whatever it is, even one that is not listed
       MeasureIndent(state, text + lineStart, text + state->fScan.fStart);
       measure = false;

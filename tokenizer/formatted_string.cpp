@@ -286,10 +286,10 @@ const char* ScanFormattedBody(FormattedStrings* strings, ScanState* state,
   }
 }
 
-// Reports the token's end on the line as ScanNextToken does.
-void FinishToken(ScanState* state, ScanCursor* cursor, const char* pos) {
-  cursor->fPos = pos;
+// Reports the token's end on the line as ScanNextToken does; returns it.
+const char* FinishToken(ScanState* state, const ScanCursor* cursor, const char* pos) {
   if (state->fComplete == 1 || pos == cursor->fLineEnd) state->fEnd = OffsetOf(cursor, pos);
+  return pos;
 }
 
 }  // namespace
@@ -311,15 +311,15 @@ void BeginFormattedLine(FormattedStrings* strings, const ScanState* state) {
   strings->fElseAfterFirst = 0;
 }
 
-void ScanNextTokenNested(const OperatorTable* table, ScanState* state, ScanCursor* cursor,
-                         FormattedStrings* strings) {
-  const char* pos = cursor->fPos;
-  const char* end = cursor->fLineEnd;
+// Kept out of the classic reading's loop, which only tests for a stack to call it with.
+[[gnu::noinline]] const char* ScanFormattedToken(ScanState* state, ScanCursor cursor,
+                                                 FormattedStrings* strings) {
+  const char* pos = cursor.fPos;
+  const char* end = cursor.fLineEnd;
   if (state->fTokenId == STRING_TOKEN && state->fComplete == 0) {
     // The line begins inside an open string; fStart stays on the line where it began.
-    if (strings->fDepth == 0 || pos == end) return ScanNextToken(table, state, cursor);
-    FinishToken(state, cursor, ScanFormattedBody(strings, state, cursor, pos));
-    return;
+    if (strings->fDepth == 0 || pos == end) return nullptr;
+    return FinishToken(state, &cursor, ScanFormattedBody(strings, state, &cursor, pos));
   }
   const char* start = SkipSpaces(pos);
   while (IsBlank(Byte(start))) start++;
@@ -327,15 +327,14 @@ void ScanNextTokenNested(const OperatorTable* table, ScanState* state, ScanCurso
     const StringStart string = FindStringStart(start, end, strings->fRules);
     if (string.fQuote && (string.fFlags & kFormattedPrefix)) {
       state->fTokenId = STRING_TOKEN;
-      state->fStart = OffsetOf(cursor, start);
+      state->fStart = OffsetOf(&cursor, start);
       state->fComplete = 1;
       strings->fDepth = 0;
       strings->fPlainQuote = 0;
       strings->fWords = 0;
       const Step opened = OpenString(strings, string, end, end);  // the first is never too deep
-      FinishToken(state, cursor, ScanFormattedBody(strings, state, cursor, opened.fPos));
-      return;
+      return FinishToken(state, &cursor, ScanFormattedBody(strings, state, &cursor, opened.fPos));
     }
   }
-  ScanNextToken(table, state, cursor);  // every other token, as the classic reading scans it
+  return nullptr;
 }

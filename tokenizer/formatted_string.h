@@ -6,7 +6,10 @@
 #pragma once
 
 #include <cstdint>
+#include <initializer_list>
 
+#include "core/token_ids.h"
+#include "tokenizer/code_units.h"
 #include "tokenizer/line_scanner.h"
 #include "tokenizer/string_prefixes.h"
 
@@ -50,7 +53,26 @@ void ResetFormattedStrings(FormattedStrings* strings, StringRules rules);
 // Notes, before a physical line is scanned, whether it begins inside a field.
 void BeginFormattedLine(FormattedStrings* strings, const ScanState* state);
 
-// ScanNextToken for the readings whose formatted strings nest: a formatted string is scanned
-// here, across physical lines; every other token as ScanNextToken scans it.
-void ScanNextTokenNested(const OperatorTable* table, ScanState* state, ScanCursor* cursor,
-                         FormattedStrings* strings);
+// Letters of the prefixes of formatted strings: f, r (rf), t (t-strings).
+struct PrefixLetters {
+  bool fRows[256];
+  constexpr PrefixLetters() : fRows() {
+    for (unsigned char letter : {'f', 'r', 't', 'F', 'R', 'T'}) fRows[letter] = true;
+  }
+};
+inline constexpr PrefixLetters kFormattedLetters;
+
+// False when no formatted string can begin at p, after a blank, nor run on: a quick test that
+// spares most tokens the call of ScanFormattedToken. The zero byte after the text ends it.
+inline bool MayScanFormatted(const ScanState* state, const char* p) {
+  if (state->fComplete == 0) return true;  // a string runs on, or no token was scanned yet
+  if (*p == ' ') p++;
+  if (IsBlank(Byte(p))) return true;  // more blanks: the call skips them
+  return kFormattedLetters.fRows[Byte(p)] &&
+         (IsQuote(Byte(p + 1)) || kFormattedLetters.fRows[Byte(p + 1)]);
+}
+
+// Scans the next token as ScanNextToken does when it is a formatted string, or one that runs
+// on from the line before, and returns where the cursor goes on; returns nullptr, with nothing
+// changed, for every other token, which ScanNextToken scans as the classic reading does.
+const char* ScanFormattedToken(ScanState* state, ScanCursor cursor, FormattedStrings* strings);

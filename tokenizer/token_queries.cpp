@@ -7,6 +7,7 @@
 
 #include "core/py_ref.h"
 #include "core/token_ids.h"
+#include "tokenizer/code_units.h"
 #include "tokenizer/operator_table.h"
 #include "tokenizer/string_prefixes.h"
 #include "tokenizer/token_start.h"
@@ -14,7 +15,9 @@
 
 int LineTokenIdForStart(const char* p, const char* end) {
   const int id = TokenIdForStart(&kOperatorTable, p, end);
-  return id == NAME_TOKEN && StartsTemplateString(p, end) ? STRING_TOKEN : id;
+  // A prefix is one letter or two: most names show they are none by their second byte.
+  if (id != NAME_TOKEN || end - p < 2 || !HasClass(Byte(p + 1), kQuote | kAsciiLetter)) return id;
+  return StartsTemplateString(p, end) ? STRING_TOKEN : id;
 }
 
 int TokenTypeOfText(PyObject* text, int skip, bool lineToken) {
