@@ -219,3 +219,14 @@ def test_code_valid_for_310_reads_the_same_with_the_option(interpreter, request)
             got = parser(14, **options).GetLogicalLineListFromBuffer(data)
             assert [(l.fType, l.fIncomplete, l.fLineCount, l.fTokens) for l in got] == [
                 (l.fType, l.fIncomplete, l.fLineCount, l.fTokens) for l in want], path
+
+
+def test_dump_reads_as_the_newest_python_unless_told(tmp_path, capsys):
+    from logicalline_dump.__main__ import main
+    path = tmp_path / "new.py"
+    path.write_bytes(b"x = f'{'a'}'\n")
+    assert main(["--json", "--jobs", "2", str(path)]) == 0
+    assert "[\"f'{'a'}'\", 1, 4]" in capsys.readouterr().out
+    assert main(["--json", "--python", "3.11", str(path)]) == 0
+    assert "[\"f'{'\", 1, 4]" in capsys.readouterr().out
+    assert main(["--python", "3", str(path)]) == 2
