@@ -80,9 +80,39 @@ bool StartsNewStatement(const ReadingState* state, int k, int depthBefore) {
   return IsStatementKeyword(first);
 }
 
+// The first token inside a field of a formatted string that runs on from the line before, tested
+// as the first token of a line inside brackets is. The string's fields count as tokens of the
+// line: the "if" of a conditional expression may stand in one, and its "else" in another.
+bool FieldLineStartsStatement(const ReadingState* state, int k) {
+  const FormattedStrings& strings = state->fStrings;
+  if (strings.fFirstStart < 0) return false;  // blank, or only a comment
+  const TokenText first(state->fText.fData + strings.fFirstStart,
+                        strings.fFirstEnd - strings.fFirstStart);
+  if (first.At(0) == '@') return true;
+  if (first.Is("if")) {
+    if (state->fTokenCount >= kLongLineTokens) return false;
+    const bool stillOpen = state->fScan.fComplete == 0 && state->fScan.fTokenId == STRING_TOKEN;
+    if (stillOpen || state->fNesting > 0) return false;
+    if (strings.fElseAfterFirst || AnyTokenIs(state, k, state->fTokenCount, "else")) return false;
+    return !(strings.fWordsBeforeFirst & kForWord) && !AnyTokenIs(state, 0, k, "for");
+  }
+  if (first.Is("else")) {
+    if (k >= kLongLineTokens) return false;
+    return !(strings.fWordsBeforeFirst & kIfWord) && !AnyTokenIs(state, 0, k, "if");
+  }
+  return IsStatementKeyword(first);
+}
+
+// Whether the physical line just tokenized, whose first token is at index k, begins a new
+// logical line.
+bool LineStartsStatement(const ReadingState* state, int k, int depthBefore) {
+  if (state->fStrings.fLineBeganInField) return FieldLineStartsStatement(state, k);
+  return state->fTokenCount > k && StartsNewStatement(state, k, depthBefore);
+}
+
 // Moves the physical line at lineStart back into the pending line, which is always empty
-// here: the reader has just taken from it.
-int HandBack(ReadingState* state, int lineStart, int k) {
+// here: the reader has just taken from it. `before` is the scanner's state before the line.
+int HandBack(ReadingState* state, int lineStart, int k, const ScanState& before) {
   TruncateTokens(state, k);
   if (AppendBytes(&state->fPending, state->fText.fData + lineStart,
                   state->fText.fLength - static_cast<size_t>(lineStart)) != 0) {
@@ -91,7 +121,11 @@ int HandBack(ReadingState* state, int lineStart, int k) {
   }
   TruncateText(&state->fText, static_cast<size_t>(lineStart));
   state->fPendingOffset = state->fLineOffset;
-  state->fScan.fComplete = 1;  // a string opened by the handed-back line is not ours
+  if (state->fStrings.fLineBeganInField) {
+    state->fScan = before;  // the string ends before the line, as an error token
+  } else {
+    state->fScan.fComplete = 1;  // a string opened by the handed-back line is not ours
+  }
   return 0;
 }
 
@@ -105,12 +139,13 @@ int ReadPhysicalLines(ReadingState* state, int* open, int64_t* offset) {
     const int lineStart = TextLength(state);
     const int depthBefore = state->fNesting;
     const int k = state->fTokenCount;
+    const ScanState before = state->fScan;
     if (ReadSourceLine(state) != 0) return -1;
     if (state->fAtEnd) break;  // this read is not counted
     state->fLineIndex++;
     if (TokenizePhysicalLine(state, lineStart) != 0) return -1;
-    if (state->fTokenCount > k && StartsNewStatement(state, k, depthBefore))
-      return HandBack(state, lineStart, k);  // stays open: the line is incomplete
+    if (LineStartsStatement(state, k, depthBefore))
+      return HandBack(state, lineStart, k, before);  // stays open: the line is incomplete
     state->fLineNumber++;
     *open = IsLineOpen(state);
   }

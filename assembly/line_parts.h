@@ -8,6 +8,7 @@
 
 #include "core/token_position.h"
 #include "tokenizer/operator_table.h"
+#include "tokenizer/string_prefixes.h"
 
 struct ReadOptions {
   const OperatorTable* fOperatorTable;
@@ -15,6 +16,7 @@ struct ReadOptions {
   bool fSkipWhitespaceLines;  // a line of comments only is not handed back
   bool fRemoveComments;       // comment tokens are not listed
   bool fIncludeLineText;      // the parts carry the line's source text
+  StringRules fStringRules;   // how formatted strings are read
 };
 
 // The parts of one logical line. Everything is borrowed from the reader, valid until it reads

@@ -57,6 +57,7 @@ void StartLogicalLine(ReadingState* state) {
   state->fTokenCount = 0;
   TruncateText(&state->fText, 0);
   state->fScan = kFreshScan;
+  ResetFormattedStrings(&state->fStrings, state->fOptions.fStringRules);
   state->fIndent = -1;
   state->fTabsInIndent = 0;
   state->fSpacesInIndent = 0;

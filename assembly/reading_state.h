@@ -12,6 +12,7 @@
 #include "assembly/line_parts.h"
 #include "core/text_buffer.h"
 #include "core/token_position.h"
+#include "tokenizer/formatted_string.h"
 #include "tokenizer/token_start.h"
 
 constexpr int kInlineLineStarts = 8;
@@ -48,6 +49,7 @@ struct ReadingState {
   int* fLineStarts;       // offset in fText of each physical line 0..fLineIndex
   size_t fLineStartCapacity;
   int fInlineLineStarts[kInlineLineStarts];
+  FormattedStrings fStrings;  // the formatted strings open in fScan's string, when it is one
 };
 
 // Sets up a call's state for reading through readline, numbering from firstLine.

@@ -12,6 +12,7 @@
 
 #include "assembly/token_cache.h"
 #include "core/token_ids.h"
+#include "tokenizer/formatted_string.h"
 #include "tokenizer/line_scanner.h"
 #include "tokenizer/token_text.h"
 
@@ -186,10 +187,24 @@ int TokenizePhysicalLine(ReadingState* state, int lineStart) {
                     .fPos = text + lineStart,
                     .fAtEnd = 0};
   const OperatorTable* table = state->fOptions.fOperatorTable;
+  // Only the readings whose formatted strings nest take the longer way round each token.
+  FormattedStrings* strings = nullptr;
+  if (state->fOptions.fStringRules != StringRules::kClassic) {
+    strings = &state->fStrings;
+    BeginFormattedLine(strings, &state->fScan);
+  }
   bool measure = state->fLineIndex == 0;
   for (;;) {
-    ScanNextToken(table, &state->fScan, &cursor);
-    if (cursor.fAtEnd) return 0;
+    // The cursor goes by value, so that the classic loop keeps it in registers.
+    const char* formattedEnd = nullptr;
+    if (strings && MayScanFormatted(&state->fScan, cursor.fPos)) [[unlikely]]
+      formattedEnd = ScanFormattedToken(&state->fScan, cursor, strings);
+    if (formattedEnd) [[unlikely]] {
+      cursor.fPos = formattedEnd;
+    } else {
+      ScanNextToken(table, &state->fScan, &cursor);
+      if (cursor.fAtEnd) return 0;
+    }
     if (measure) {  // at the first token, whatever it is, even one that is not listed
       if (MeasureIndent(state, text + lineStart, text + state->fScan.fStart) != 0) return -1;
       measure = false;

@@ -3,8 +3,8 @@ GetLogicalLineListFromBuffer over the same bytes, which must read them as the re
 BytesIO does.
 
 Input layout: byte 0 the parser options (low 4 bits) and how the source is cut (high bits),
-byte 1 the first line, byte 2 the line count, byte 3 what readline does besides handing out
-bytes, bytes 4.. the source (so a seed is four header bytes and then a source file). With
+byte 1 the first line, byte 2 the line count (low bits) and the Python version whose strings
+are read (high bits), byte 3 what readline does besides handing out bytes, bytes 4.. the source (so a seed is four header bytes and then a source file). With
 --hook a create hook is installed for the whole run; byte 3 also picks its behaviour.
 
 Failures: any exception other than the ones the module documents for the input at hand, a
@@ -19,6 +19,7 @@ import logicalline
 
 FIRST_LINES = (0, 1, 7, 1000, 65535, 65536, 2**31 - 3, 2**31 - 1, -1)
 LINE_COUNTS = (-1, -1, -1, 0, 1, 2, 3, 10, 2**31 - 1, -2)
+FEATURE_VERSIONS = (None, (3, 11), (3, 12), (3, 14))
 
 
 class ReadlineError(Exception):
@@ -123,7 +124,9 @@ def TestOneInput(data, with_hook=False):
     first = FIRST_LINES[first_pick % len(FIRST_LINES)]
     count = LINE_COUNTS[count_pick % len(LINE_COUNTS)]
     HOOK["kind"] = (action >> 3) % 5
-    parser = logicalline.CreateLogicalLineParser(*(options >> bit & 1 for bit in range(4)))
+    version = FEATURE_VERSIONS[(count_pick >> 4) % len(FEATURE_VERSIONS)]
+    parser = logicalline.CreateLogicalLineParser(*(options >> bit & 1 for bit in range(4)),
+                                                 feature_version=version)
     readline = MakeReadline(chunks, action)
     try:
         lines = parser.GetLogicalLineList(readline, first, count)

@@ -1,5 +1,6 @@
-"""Parses every .py file under a directory with all 16 parser option sets and reads back every
-attribute and token of every line, so that a sanitizer build sees each path on real source.
+"""Parses every .py file under a directory with all 16 parser option sets, and the default set
+reading strings as Python 3.12 and 3.14 do, and reads back every attribute and token of every
+line, so that a sanitizer build sees each path on real source.
 
 usage: python3.10 fuzz/parse_tree.py [DIR] [--every N]
 DIR defaults to the standard library (the directory of os.__file__); --every N parses only
@@ -45,10 +46,10 @@ def ParseFile(path, parsers):
             if b"\0" not in data:
                 raise AssertionError(f"{path}: {e}")
             continue
-        # Every getter and method on the lines of the all-off and all-on parsers; the
-        # other option sets only build their lines and decode their text.
+        # Every getter and method on the lines of the all-off and all-on parsers, and of the
+        # newest reading; the other option sets only build their lines and decode their text.
         for line in result:
-            if index in (0, len(parsers) - 1):
+            if index in (0, 15, len(parsers) - 1):
                 TouchLine(line)
             else:
                 try:
@@ -68,6 +69,7 @@ def main():
                    for n in names if n.endswith(".py"))[::options.every]
     parsers = [logicalline.CreateLogicalLineParser(*flags)
                for flags in itertools.product((0, 1), repeat=4)]
+    parsers += [logicalline.CreateLogicalLineParser(feature_version=(3, minor)) for minor in (12, 14)]
     start = time.monotonic()
     lines = sum(ParseFile(path, parsers) for path in paths)
     print(f"parsed {len(paths)} files x {len(parsers)} option sets: {lines} logical lines "

@@ -68,7 +68,7 @@ for target in ("reading", "reading-hook", "lines", "update"):
 for i, path in enumerate(paths):
     with open(path, "rb") as f:
         source = f.read(4096)
-    seeds = {"reading": bytes([rng.randrange(48), 0, 0, 0]) + source,
+    seeds = {"reading": bytes([rng.randrange(48), 0, rng.randrange(4) << 4, 0]) + source,
              "reading-hook": bytes([rng.randrange(48), 0, 0, rng.randrange(40)]) + source,
              "lines": bytes([rng.randrange(16), 24]) + source + rng.randbytes(48),
              "update": bytes([rng.randrange(16)]) + source[:1536] + b"\xff\xfe" + rng.randbytes(32)}

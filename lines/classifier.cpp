@@ -10,6 +10,7 @@
 
 #include "core/token_ids.h"
 #include "tokenizer/operator_table.h"
+#include "tokenizer/token_queries.h"
 #include "tokenizer/token_start.h"
 #include "tokenizer/token_text.h"
 
@@ -63,7 +64,7 @@ int ScanDefinedName(PyObject* const* tokens, int key, int count, LineType* type,
                     PyObject** localScopeName) {
   for (int i = key + 1; i < count; i++) {
     const TokenText text(tokens[i]);
-    const int id = TokenIdForStart(&kOperatorTable, text.fBytes, text.fBytes + text.fLength);
+    const int id = LineTokenIdForStart(text.fBytes, text.fBytes + text.fLength);
     if (id == NAME_TOKEN && !text.Is("async")) {
       Py_CLEAR(*localScopeName);
       *localScopeName = PyUnicode_DecodeUTF8(text.fBytes, text.fLength, "replace");

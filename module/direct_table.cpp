@@ -69,7 +69,10 @@ int GetTokenTypeDirect(PyObject* line, int index, int skip) {
   return token ? TokenTypeOfText(token, skip) : -1;
 }
 
-int GetStringTokenTypeDirect(PyObject* text, int skip) { return TokenTypeOfText(text, skip); }
+// A bare text, which no reading made: read as the classic rules read it.
+int GetStringTokenTypeDirect(PyObject* text, int skip) {
+  return TokenTypeOfText(text, skip, /*lineToken=*/false);
+}
 
 // Each row keeps its entry's own signature type from the public header.
 template <typename Signature>

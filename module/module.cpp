@@ -33,19 +33,25 @@ PyDoc_STRVAR(kCreateLogicalLineParserDoc,
              "          tokens are removed from returned logical lines. \n"
              "       include_line_text isa boolean that controls whether to include \n"
              "          copies of logical line original text as the fLineText \n"
-             "          attribute in the logical line objects");
+             "          attribute in the logical line objects. \n"
+             "       feature_version, keyword only, is a (major, minor) tuple as \n"
+             "          ast.parse takes it: strings are read as that version of \n"
+             "          Python reads them, f-strings with nested fields from (3, 12), \n"
+             "          t-strings from (3, 14); by default as Python 3.10 does");
 PyObject* CreateLogicalLineParser(PyObject*, PyObject* args, PyObject* kwargs) {
   static const char* keywords[] = {"copy_strings", "skip_whitespace_lines", "remove_comments",
-                                   "include_line_text", nullptr};
+                                   "include_line_text", "feature_version", nullptr};
   PyObject* copyStrings = Py_True;
   PyObject* skipWhitespaceLines = Py_True;
   PyObject* removeComments = Py_True;
   PyObject* includeLineText = Py_True;
-  if (!PyArg_ParseTupleAndKeywords(args, kwargs, "|OOOO", const_cast<char**>(keywords),
+  PyObject* featureVersion = Py_None;
+  if (!PyArg_ParseTupleAndKeywords(args, kwargs, "|OOOO$O", const_cast<char**>(keywords),
                                    &copyStrings, &skipWhitespaceLines, &removeComments,
-                                   &includeLineText))
+                                   &includeLineText, &featureVersion))
     return nullptr;
-  return NewParser(copyStrings, skipWhitespaceLines, removeComments, includeLineText);
+  return NewParser(copyStrings, skipWhitespaceLines, removeComments, includeLineText,
+                   featureVersion);
 }
 
 PyDoc_STRVAR(kGetDirectLogicalLineFunctionTableDoc,

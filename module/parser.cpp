@@ -19,6 +19,50 @@ int StoreTruth(PyObject* option, int* field) {
   return 0;
 }
 
+// The first minor version of 3 that reads each way; earlier ones read as the classic rules do.
+constexpr struct {
+  long fMinor;
+  StringRules fRules;
+} kRulesByVersion[] = {
+    {14, StringRules::kTemplates},
+    {12, StringRules::kFormatted},
+};
+
+// Returns the minor version of a (3, minor) tuple of ints, or -1 with TypeError or ValueError.
+long MinorVersion(PyObject* version) {
+  if (!PyTuple_Check(version) || PyTuple_GET_SIZE(version) != 2 ||
+      !PyLong_Check(PyTuple_GET_ITEM(version, 0)) || !PyLong_Check(PyTuple_GET_ITEM(version, 1))) {
+    PyErr_Format(PyExc_TypeError, "feature_version must be a (major, minor) tuple of ints, not %R",
+                 version);
+    return -1;
+  }
+  int overflow = 0;
+  const long major = PyLong_AsLongAndOverflow(PyTuple_GET_ITEM(version, 0), &overflow);
+  const long minor = overflow ? -1 : PyLong_AsLongAndOverflow(PyTuple_GET_ITEM(version, 1), &overflow);
+  if (major != 3 || minor < 0 || overflow) {
+    PyErr_Format(PyExc_ValueError, "feature_version must be (3, minor) with a minor of 0 or more, not %R",
+                 version);
+    return -1;
+  }
+  return minor;
+}
+
+// Stores the string rules of a feature version; None, the default, reads as the classic rules
+// do. Returns -1 with an exception set when the version is refused.
+int StoreStringRules(PyObject* version, StringRules* field) {
+  *field = StringRules::kClassic;
+  if (version == Py_None) return 0;
+  const long minor = MinorVersion(version);
+  if (minor < 0) return -1;
+  for (const auto& row : kRulesByVersion) {
+    if (minor >= row.fMinor) {
+      *field = row.fRules;
+      break;
+    }
+  }
+  return 0;
+}
+
 // Each method is defined, with its docstring, where its work is done.
 PyMethodDef kParserMethods[] = {
     kGetLogicalLineListMethod,
@@ -43,14 +87,15 @@ PyTypeObject LogicalLineParserType = {
 #pragma GCC diagnostic pop
 
 PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObject* removeComments,
-                    PyObject* includeLineText) {
+                    PyObject* includeLineText, PyObject* featureVersion) {
   LogicalLineParser* parser = PyObject_New(LogicalLineParser, &LogicalLineParserType);
   if (!parser) return nullptr;
   parser->fOperatorTable = &kOperatorTable;
   if (StoreTruth(skipWhitespaceLines, &parser->fSkipWhitespaceLines) != 0 ||
       StoreTruth(removeComments, &parser->fRemoveComments) != 0 ||
       StoreTruth(copyStrings, &parser->fCopyStrings) != 0 ||
-      StoreTruth(includeLineText, &parser->fIncludeLineText) != 0) {
+      StoreTruth(includeLineText, &parser->fIncludeLineText) != 0 ||
+      StoreStringRules(featureVersion, &parser->fStringRules) != 0) {
     Py_DECREF(parser);
     return nullptr;
   }
@@ -63,5 +108,6 @@ ReadOptions ParserOptions(PyObject* self) {
                      .fCopyStrings = parser->fCopyStrings != 0,
                      .fSkipWhitespaceLines = parser->fSkipWhitespaceLines != 0,
                      .fRemoveComments = parser->fRemoveComments != 0,
-                     .fIncludeLineText = parser->fIncludeLineText != 0};
+                     .fIncludeLineText = parser->fIncludeLineText != 0,
+                     .fStringRules = parser->fStringRules};
 }

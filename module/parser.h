@@ -6,6 +6,7 @@
 
 #include "assembly/line_parts.h"
 #include "tokenizer/operator_table.h"
+#include "tokenizer/string_prefixes.h"
 
 struct LogicalLineParser {
   PyObject_HEAD
@@ -14,15 +15,17 @@ struct LogicalLineParser {
   int fRemoveComments;       // comment tokens are not listed
   const OperatorTable* fOperatorTable;  // always the module's one table
   int fIncludeLineText;      // lines carry their source text
+  StringRules fStringRules;  // the interpreter version whose strings the parser reads
 };
 
 extern PyTypeObject LogicalLineParserType;
 
 // Returns a new parser whose options are the truth values of the four objects, taken in the
-// order skip_whitespace_lines, remove_comments, copy_strings, include_line_text; nullptr with
-// the exception of the first truth test that raises.
+// order skip_whitespace_lines, remove_comments, copy_strings, include_line_text, and the
+// string rules of featureVersion; nullptr with the exception of the first truth test that
+// raises, or of a feature version that is refused.
 PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObject* removeComments,
-                    PyObject* includeLineText);
+                    PyObject* includeLineText, PyObject* featureVersion);
 
 // The options of a parser, as the reader takes them.
 ReadOptions ParserOptions(PyObject* parser);

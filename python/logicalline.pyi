@@ -151,6 +151,8 @@ def CreateLogicalLineParser(
     skip_whitespace_lines: object = True,
     remove_comments: object = True,
     include_line_text: object = True,
+    *,
+    feature_version: tuple[int, int] | None = None,
 ) -> LogicalLineParser: ...
 
 # A new capsule named "kLogicalLineFunctionTable" on every call; see logicalline_direct.h.

@@ -27,7 +27,8 @@ int BackslashRun(const char* from, const char* before) {
 
 // Steps over a name: its first character, then every character that may continue it. ASCII
 // needs no decoding, and no bounds check: the text buffer's zero padding is no name character.
-const char* ScanName(const char* p, const char* end) {
+// Inlined into the scanner's loop, whatever else calls it.
+[[gnu::always_inline]] inline const char* ScanName(const char* p, const char* end) {
   p += StepOverChar(p, end);
   for (;;) {
     while (HasClass(Byte(p), kNameChar)) p++;
@@ -46,6 +47,8 @@ bool IsNumberSuffixLetter(unsigned b) {
 }
 
 }  // namespace
+
+const char* ScanNameEnd(const char* p, const char* end) { return ScanName(p, end); }
 
 const char* ScanNumber(const char* p, const char* end) {
   p++;  // a digit, or a dot before a digit

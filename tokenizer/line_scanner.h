@@ -23,5 +23,9 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
 // the token ends on this line.
 const char* ScanStringBody(ScanState* state, const ScanCursor* cursor, const char* from);
 
+// Returns the end of the name that begins at p, as the scanner steps over names. A zero byte
+// follows the text.
+const char* ScanNameEnd(const char* p, const char* end);
+
 // Returns the end of the number that begins at p.
 const char* ScanNumber(const char* p, const char* end);

@@ -7,11 +7,20 @@
 
 #include "core/py_ref.h"
 #include "core/token_ids.h"
+#include "tokenizer/code_units.h"
 #include "tokenizer/operator_table.h"
+#include "tokenizer/string_prefixes.h"
 #include "tokenizer/token_start.h"
 #include "tokenizer/token_text.h"
 
-int TokenTypeOfText(PyObject* text, int skip) {
+int LineTokenIdForStart(const char* p, const char* end) {
+  const int id = TokenIdForStart(&kOperatorTable, p, end);
+  // A prefix is one letter or two: most names show they are none by their second byte.
+  if (id != NAME_TOKEN || end - p < 2 || !HasClass(Byte(p + 1), kQuote | kAsciiLetter)) return id;
+  return StartsTemplateString(p, end) ? STRING_TOKEN : id;
+}
+
+int TokenTypeOfText(PyObject* text, int skip, bool lineToken) {
   PyRef encoded;
   if (PyUnicode_Check(text)) {
     encoded = PyRef::Steal(PyUnicode_AsUTF8String(text));
@@ -26,7 +35,9 @@ int TokenTypeOfText(PyObject* text, int skip) {
     if (!skip) return ERROR_TOKEN;
     token = TokenText(token.fBytes + kErrorPrefixLength, token.fLength - kErrorPrefixLength);
   }
-  return TokenIdForStart(&kOperatorTable, token.fBytes, token.fBytes + token.fLength);
+  const char* end = token.fBytes + token.fLength;
+  return lineToken ? LineTokenIdForStart(token.fBytes, end)
+                   : TokenIdForStart(&kOperatorTable, token.fBytes, end);
 }
 
 PyObject* TokenStr(PyObject* token, int skip) {

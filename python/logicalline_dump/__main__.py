@@ -70,6 +70,17 @@ def parse_options(text):
     return settings
 
 
+# The newest Python whose strings the module reads as that version does.
+NEWEST_PYTHON = (3, 14)
+
+
+def parse_python(text):
+    major, dot, minor = text.partition(".")
+    if not (dot and major.isdigit() and minor.isdigit()) or int(major) != 3:
+        raise argparse.ArgumentTypeError(f"--python takes a version such as 3.12, not {text!r}")
+    return int(major), int(minor)
+
+
 def parse_jobs(text):
     jobs = int(text)
     if jobs < 0:
@@ -108,6 +119,11 @@ def main(argv=None):
     arguments.add_argument("--json", action="store_true", help="write JSON Lines to stdout")
     arguments.add_argument("--options", type=parse_options, action="append", default=[],
                            metavar="NAME=BOOL,...", help="set parser options (default: all on)")
+    arguments.add_argument(
+        "--python", type=parse_python, default=NEWEST_PYTHON, metavar="X.Y",
+        help="read strings as Python X.Y does: f-strings with nested fields from 3.12, "
+             "t-strings from 3.14 (default: %s, the newest the module knows, so that code reads "
+             "as it runs)" % ".".join(map(str, NEWEST_PYTHON)))
     arguments.add_argument("--jobs", "-j", type=parse_jobs, default=1, metavar="N",
                            help="parse in N worker processes, 0 for one per core (default: 1)")
     arguments.add_argument("--quiet", "-q", action="store_true", help="show no progress")
@@ -118,6 +134,7 @@ def main(argv=None):
     settings = {}
     for chosen in options.options:
         settings.update(chosen)
+    settings["feature_version"] = options.python  # workers make their parsers from settings
     parser = logicalline.CreateLogicalLineParser(**settings)
     style = "summary" if options.summary else "json" if options.json else "text"
     out, failures, counts = sys.stdout, [], collections.Counter()
