@@ -42,7 +42,9 @@ PyObject* CachedBytes(const char* p, Py_ssize_t n) {
   const size_t set = TextSetOf(head, tail, n);
   const TextSlot* found = gTokenTexts.Find(set, [&](const TextSlot& slot) {
     return slot.fHead == head && slot.fTail == tail && slot.fLength == n &&
-           (n <= 16 || memcmp(PyBytes_AS_STRING(slot.fBytes) + 8, p + 8,
+           // Through a plain pointer: clang's bounds check takes the bytes object's one-byte
+           // array for the bound of the text.
+           (n <= 16 || memcmp(TokenText(slot.fBytes).fBytes + 8, p + 8,
                               static_cast<size_t>(n - 16)) == 0);
   });
   if (found) return Py_NewRef(found->fBytes);

@@ -103,7 +103,7 @@ def Operate(lines, models, op, arg):
         first, count = NUMBERS[arg % len(NUMBERS)], NUMBERS[(arg >> 4) % len(NUMBERS)]
         fits = all(-2**31 <= n < 2**31 for n in (first, count))
         if Expect(None if fits else OverflowError, line.SetLineRange, first, count):
-            model.first, model.count = first, (count + 2**15) % 2**16 - 2**15
+            model.first, model.count = first, count
     elif op == 6:
         line.SetParsed(obj)
         model.parsed = bool(obj)
