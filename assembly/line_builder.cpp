@@ -23,8 +23,10 @@ constexpr std::string_view kStatementKeywords[] = {
     "finally", "from", "global", "import", "pass", "raise", "return", "try", "while",
 };
 
-// Beyond this many tokens a line starting with "if" or "else" is taken as a continuation.
-constexpr int kLongLineTokens = 50;
+// A line starting with "if" continues a logical line that holds this many tokens with its own
+// included; one starting with "else" continues a logical line that holds this many before it.
+constexpr int kIfContinuesFromTokens = 50;
+constexpr int kElseContinuesAfterTokens = 50;
 
 TokenText TextOf(const ReadingState* state, int i) { return TokenText(state->fTokenArray[i]); }
 
@@ -65,7 +67,7 @@ bool StartsNewStatement(const ReadingState* state, int k, int depthBefore) {
     if (first.Is("for")) return true;
   }
   if (first.Is("if")) {
-    if (state->fTokenCount >= kLongLineTokens) return false;
+    if (state->fTokenCount >= kIfContinuesFromTokens) return false;
     if (LastTokenIsTrailingBackslash(state)) return false;
     if (state->fNesting > 0) return false;
     if (AnyTokenIs(state, k + 1, state->fTokenCount, "else")) return false;  // a conditional
@@ -73,7 +75,7 @@ bool StartsNewStatement(const ReadingState* state, int k, int depthBefore) {
     return true;
   }
   if (first.Is("else")) {
-    if (k >= kLongLineTokens) return false;
+    if (k >= kElseContinuesAfterTokens) return false;
     if (k == 0) return true;
     return !AnyTokenIs(state, 0, k, "if");  // a conditional expression
   }
@@ -90,14 +92,14 @@ bool FieldLineStartsStatement(const ReadingState* state, int k) {
                         strings.fFirstEnd - strings.fFirstStart);
   if (first.At(0) == '@') return true;
   if (first.Is("if")) {
-    if (state->fTokenCount >= kLongLineTokens) return false;
+    if (state->fTokenCount >= kIfContinuesFromTokens) return false;
     const bool stillOpen = state->fScan.fComplete == 0 && state->fScan.fTokenId == STRING_TOKEN;
     if (stillOpen || state->fNesting > 0) return false;
     if (strings.fElseAfterFirst || AnyTokenIs(state, k, state->fTokenCount, "else")) return false;
     return !(strings.fWordsBeforeFirst & kForWord) && !AnyTokenIs(state, 0, k, "for");
   }
   if (first.Is("else")) {
-    if (k >= kLongLineTokens) return false;
+    if (k >= kElseContinuesAfterTokens) return false;
     return !(strings.fWordsBeforeFirst & kIfWord) && !AnyTokenIs(state, 0, k, "if");
   }
   return IsStatementKeyword(first);

@@ -21,7 +21,8 @@ namespace {
 constexpr int kTabWidth = 8;
 constexpr char kStringPlaceholder[] = "'<string>'";
 
-bool IsSignificant(unsigned first) { return first != '#' && first != '\n'; }
+// Every listed token but a comment: line breaks are never listed.
+bool IsSignificant(unsigned first) { return first != '#'; }
 
 bool KeepToken(const ReadingState* state) {
   const int id = state->fScan.fTokenId;

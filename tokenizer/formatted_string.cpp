@@ -28,10 +28,6 @@ struct Step {
   Outcome fOutcome;
 };
 
-int OffsetOf(const ScanCursor* cursor, const char* p) {
-  return static_cast<int>(p - cursor->fLineStart) + cursor->fBase;
-}
-
 FormattedLevel* Innermost(FormattedStrings* strings) {
   return &strings->fLevels[strings->fDepth - 1];
 }

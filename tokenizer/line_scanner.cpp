@@ -10,10 +10,6 @@
 
 namespace {
 
-int OffsetOf(const ScanCursor* cursor, const char* p) {
-  return static_cast<int>(p - cursor->fLineStart) + cursor->fBase;
-}
-
 // Counts the backslashes in the run that ends just before `before`, going back no further
 // than `from`.
 int BackslashRun(const char* from, const char* before) {
@@ -153,7 +149,6 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
         break;
     }
   }
-  if (pos > end) pos = end;
-  cursor->fPos = pos;
+  cursor->fPos = pos;  // every step stops at the line's end at the latest
   if (state->fComplete == 1 || pos == end) state->fEnd = OffsetOf(cursor, pos);
 }

@@ -14,6 +14,11 @@ struct ScanCursor {
   int fAtEnd;              // 1 once a call found no further token
 };
 
+// The offset in the logical line text of a position on the cursor's line.
+inline int OffsetOf(const ScanCursor* cursor, const char* p) {
+  return static_cast<int>(p - cursor->fLineStart) + cursor->fBase;
+}
+
 // Scans the next token into the state and moves the cursor past it, or sets fAtEnd. A token
 // left with fComplete 0 is a string that continues on the next physical line. The line is the
 // last of the text, which lies in a TextBuffer and so is followed by its zero padding.
