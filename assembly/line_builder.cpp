@@ -28,7 +28,7 @@ constexpr std::string_view kStatementKeywords[] = {
 constexpr int kIfContinuesFromTokens = 50;
 constexpr int kElseContinuesAfterTokens = 50;
 
-TokenText TextOf(const ReadingState* state, int i) { return TokenText(state->fTokenArray[i]); }
+TokenText TextOf(const LineTokens& tokens, int i) { return TokenText(tokens.fTokenArray[i]); }
 
 bool IsStatementKeyword(const TokenText& text) {
   for (std::string_view word : kStatementKeywords) {
@@ -38,46 +38,52 @@ bool IsStatementKeyword(const TokenText& text) {
 }
 
 bool LastTokenIsTrailingBackslash(const ReadingState* state) {
-  const int last = state->fTokenCount - 1;
-  return TextOf(state, last).At(0) == '\\' &&
-         state->fTokenPositions[last].fLine == state->fLineIndex;
+  const LineTokens& tokens = state->fTokens;
+  const int last = tokens.fTokenCount - 1;
+  return TextOf(tokens, last).At(0) == '\\' &&
+         tokens.fTokenPositions[last].fLine == state->fLineIndex;
 }
 
-bool AnyTokenIs(const ReadingState* state, int from, int to, std::string_view word) {
+bool AnyTokenIs(const LineTokens& tokens, int from, int to, std::string_view word) {
   for (int i = from; i < to; i++) {
-    if (TextOf(state, i).Is(word)) return true;
+    if (TextOf(tokens, i).Is(word)) return true;
   }
   return false;
+}
+
+bool StringRunsOn(const LineTokens& tokens) {
+  return tokens.fScan.fComplete == 0 && tokens.fScan.fTokenId == STRING_TOKEN;
 }
 
 bool IsLineOpen(const ReadingState* state) {
   // Only an open string counts here: a first line of blanks without a line break scans
   // nothing and must stay a blank line rather than swallow the next one.
-  if (state->fScan.fComplete == 0 && state->fScan.fTokenId == STRING_TOKEN) return true;
-  if (state->fTokenCount == 0) return false;
+  if (StringRunsOn(state->fTokens)) return true;
+  if (state->fTokens.fTokenCount == 0) return false;
   if (LastTokenIsTrailingBackslash(state)) return true;
-  return state->fNesting > 0;
+  return state->fTokens.fNesting > 0;
 }
 
 bool StartsNewStatement(const ReadingState* state, int k, int depthBefore) {
-  const TokenText first = TextOf(state, k);
+  const LineTokens& tokens = state->fTokens;
+  const TokenText first = TextOf(tokens, k);
   if (first.At(0) == '@') return true;
   if (depthBefore <= 0) {
-    if (k > 0 && TextOf(state, k - 1).At(0) == '\\') return false;
+    if (k > 0 && TextOf(tokens, k - 1).At(0) == '\\') return false;
     if (first.Is("for")) return true;
   }
   if (first.Is("if")) {
-    if (state->fTokenCount >= kIfContinuesFromTokens) return false;
+    if (tokens.fTokenCount >= kIfContinuesFromTokens) return false;
     if (LastTokenIsTrailingBackslash(state)) return false;
-    if (state->fNesting > 0) return false;
-    if (AnyTokenIs(state, k + 1, state->fTokenCount, "else")) return false;  // a conditional
-    if (AnyTokenIs(state, 0, k, "for")) return false;                        // a comprehension
+    if (tokens.fNesting > 0) return false;
+    if (AnyTokenIs(tokens, k + 1, tokens.fTokenCount, "else")) return false;  // a conditional
+    if (AnyTokenIs(tokens, 0, k, "for")) return false;                        // a comprehension
     return true;
   }
   if (first.Is("else")) {
     if (k >= kElseContinuesAfterTokens) return false;
     if (k == 0) return true;
-    return !AnyTokenIs(state, 0, k, "if");  // a conditional expression
+    return !AnyTokenIs(tokens, 0, k, "if");  // a conditional expression
   }
   return IsStatementKeyword(first);
 }
@@ -86,21 +92,21 @@ bool StartsNewStatement(const ReadingState* state, int k, int depthBefore) {
 // as the first token of a line inside brackets is. The string's fields count as tokens of the
 // line: the "if" of a conditional expression may stand in one, and its "else" in another.
 bool FieldLineStartsStatement(const ReadingState* state, int k) {
-  const FormattedStrings& strings = state->fStrings;
+  const LineTokens& tokens = state->fTokens;
+  const FormattedStrings& strings = tokens.fStrings;
   if (strings.fFirstStart < 0) return false;  // blank, or only a comment
-  const TokenText first(state->fText.fData + strings.fFirstStart,
+  const TokenText first(state->fSource.fText.fData + strings.fFirstStart,
                         strings.fFirstEnd - strings.fFirstStart);
   if (first.At(0) == '@') return true;
   if (first.Is("if")) {
-    if (state->fTokenCount >= kIfContinuesFromTokens) return false;
-    const bool stillOpen = state->fScan.fComplete == 0 && state->fScan.fTokenId == STRING_TOKEN;
-    if (stillOpen || state->fNesting > 0) return false;
-    if (strings.fElseAfterFirst || AnyTokenIs(state, k, state->fTokenCount, "else")) return false;
-    return !(strings.fWordsBeforeFirst & kForWord) && !AnyTokenIs(state, 0, k, "for");
+    if (tokens.fTokenCount >= kIfContinuesFromTokens) return false;
+    if (StringRunsOn(tokens) || tokens.fNesting > 0) return false;
+    if (strings.fElseAfterFirst || AnyTokenIs(tokens, k, tokens.fTokenCount, "else")) return false;
+    return !(strings.fWordsBeforeFirst & kForWord) && !AnyTokenIs(tokens, 0, k, "for");
   }
   if (first.Is("else")) {
     if (k >= kElseContinuesAfterTokens) return false;
-    return !(strings.fWordsBeforeFirst & kIfWord) && !AnyTokenIs(state, 0, k, "if");
+    return !(strings.fWordsBeforeFirst & kIfWord) && !AnyTokenIs(tokens, 0, k, "if");
   }
   return IsStatementKeyword(first);
 }
@@ -108,46 +114,33 @@ bool FieldLineStartsStatement(const ReadingState* state, int k) {
 // Whether the physical line just tokenized, whose first token is at index k, begins a new
 // logical line.
 bool LineStartsStatement(const ReadingState* state, int k, int depthBefore) {
-  if (state->fStrings.fLineBeganInField) return FieldLineStartsStatement(state, k);
-  return state->fTokenCount > k && StartsNewStatement(state, k, depthBefore);
-}
-
-// Moves the physical line at lineStart back into the pending line, which is always empty
-// here: the reader has just taken from it. `before` is the scanner's state before the line.
-int HandBack(ReadingState* state, int lineStart, int k, const ScanState& before) {
-  TruncateTokens(state, k);
-  if (AppendBytes(&state->fPending, state->fText.fData + lineStart,
-                  state->fText.fLength - static_cast<size_t>(lineStart)) != 0) {
-    PyErr_NoMemory();
-    return -1;
-  }
-  TruncateText(&state->fText, static_cast<size_t>(lineStart));
-  state->fPendingOffset = state->fLineOffset;
-  if (state->fStrings.fLineBeganInField) {
-    state->fScan = before;  // the string ends before the line, as an error token
-  } else {
-    state->fScan.fComplete = 1;  // a string opened by the handed-back line is not ours
-  }
-  return 0;
+  if (state->fTokens.fStrings.fLineBeganInField) return FieldLineStartsStatement(state, k);
+  return state->fTokens.fTokenCount > k && StartsNewStatement(state, k, depthBefore);
 }
 
 // Reads the logical line's physical lines. Returns 0 with *open set, or -1.
 int ReadPhysicalLines(ReadingState* state, int* open, int64_t* offset) {
-  if (ReadSourceLine(state) != 0 || TokenizePhysicalLine(state, 0) != 0) return -1;
-  *offset = state->fLineOffset;
+  SourceLines* source = &state->fSource;
+  if (ReadSourceLine(source, state->fLineNumber) != 0 || TokenizePhysicalLine(state, 0) != 0)
+    return -1;
+  *offset = source->fLineOffset;
   state->fLineNumber++;
   *open = IsLineOpen(state);
-  while (!state->fAtEnd && *open) {
+  while (!source->fAtEnd && *open) {
     const int lineStart = TextLength(state);
-    const int depthBefore = state->fNesting;
-    const int k = state->fTokenCount;
-    const ScanState before = state->fScan;
-    if (ReadSourceLine(state) != 0) return -1;
-    if (state->fAtEnd) break;  // this read is not counted
+    const int depthBefore = state->fTokens.fNesting;
+    const int k = state->fTokens.fTokenCount;
+    const ScanState before = state->fTokens.fScan;
+    if (ReadSourceLine(source, state->fLineNumber) != 0) return -1;
+    if (source->fAtEnd) break;  // this read is not counted
     state->fLineIndex++;
     if (TokenizePhysicalLine(state, lineStart) != 0) return -1;
-    if (LineStartsStatement(state, k, depthBefore))
-      return HandBack(state, lineStart, k, before);  // stays open: the line is incomplete
+    if (LineStartsStatement(state, k, depthBefore)) {
+      // The line goes back to be read as the next logical line's first, and this one stays
+      // open: it is incomplete.
+      ForgetPhysicalLine(&state->fTokens, k, before);
+      return HandBackLine(source, lineStart);
+    }
     state->fLineNumber++;
     *open = IsLineOpen(state);
   }
@@ -157,35 +150,39 @@ int ReadPhysicalLines(ReadingState* state, int* open, int64_t* offset) {
 }  // namespace
 
 int BuildLogicalLine(ReadingState* state, LineParts* parts) {
-  StartLogicalLine(state);
+  StartLineTokens(&state->fTokens);
+  StartText(&state->fSource);
+  state->fLineIndex = 0;
   const int64_t firstLine = state->fLineNumber;
   int open = 0;
   int64_t offset = 0;
   if (ReadPhysicalLines(state, &open, &offset) != 0) return -1;
-  if (state->fScan.fStart != -1 && state->fScan.fComplete == 0) {  // input ended inside a string
+  const LineTokens& tokens = state->fTokens;
+  if (tokens.fScan.fStart != -1 && tokens.fScan.fComplete == 0) {  // input ended in a string
     if (AppendUnfinishedString(state) != 0) return -1;
     open = 1;
   }
-  if (state->fTokenCount == 0 ||
-      (state->fOptions.fSkipWhitespaceLines && state->fSignificantCount == 0))
+  if (tokens.fTokenCount == 0 ||
+      (state->fOptions.fSkipWhitespaceLines && tokens.fSignificantCount == 0))
     return 0;
   const int64_t lineCount = state->fLineNumber - firstLine;
   if (firstLine > INT_MAX || lineCount > INT_MAX) {
     PyErr_SetString(PyExc_OverflowError, "Line number does not fit in 32 bits");
     return -1;
   }
+  const TextBuffer& text = state->fSource.fText;
   const bool withText = state->fOptions.fIncludeLineText;
-  *parts = LineParts{.fIndentLevel = state->fIndent,
+  *parts = LineParts{.fIndentLevel = tokens.fIndent,
                      .fFirstLine = static_cast<int>(firstLine),
                      .fLineCount = static_cast<int>(lineCount),
-                     .fTokens = state->fTokenArray,
-                     .fPositions = state->fTokenPositions,
-                     .fTokenCount = state->fTokenCount,
-                     .fSpacesInIndent = state->fSpacesInIndent,
-                     .fTabsInIndent = state->fTabsInIndent,
+                     .fTokens = tokens.fTokenArray,
+                     .fPositions = tokens.fTokenPositions,
+                     .fTokenCount = tokens.fTokenCount,
+                     .fSpacesInIndent = tokens.fSpacesInIndent,
+                     .fTabsInIndent = tokens.fTabsInIndent,
                      .fIncomplete = open,
-                     .fLineText = withText ? state->fText.fData : nullptr,
-                     .fLineTextLength = withText ? state->fText.fLength : 0,
+                     .fLineText = withText ? text.fData : nullptr,
+                     .fLineTextLength = withText ? text.fLength : 0,
                      .fOffset = offset};
   return 1;
 }

@@ -1,6 +1,8 @@
-// ReadingState: everything one reading call keeps. Where physical lines come from, and the
-// working state of the logical line being built, which is reused from one logical line to the
-// next so that a call allocates its arrays once.
+// ReadingState: everything one reading call keeps. Each part has one writer: the source line
+// reader writes the source's part, the token list writes the tokens' part, and the builder
+// writes the numbering; reading_state.cpp sets the whole up and releases it through them. The
+// working state of the logical line being built is reused from one logical line to the next,
+// so that a call allocates its arrays once.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN
@@ -15,25 +17,29 @@
 #include "tokenizer/formatted_string.h"
 #include "tokenizer/token_start.h"
 
-constexpr int kInlineLineStarts = 8;
-
-struct ReadingState {
-  ReadOptions fOptions;
-  // The source: the host's readline, or else a buffer of the whole text.
-  PyObject* fReadline;   // borrowed from the caller, or null
+// Where physical lines come from, and the text of the logical line read from them so far.
+// Written by the source line reader (source_reader.cpp) alone.
+struct SourceLines {
+  PyObject* fReadline;   // borrowed from the caller, or null: the buffer is read
   const char* fData;     // the buffer's next physical line, when there is no readline
   const char* fDataEnd;
   TextBuffer fPending;   // a physical line read but handed back: the next line to read
-  int64_t fLineNumber;   // number of the next physical line to read
   int fAtEnd;            // 1 once readline returned b""
   int fAtStart;          // 1 until the first physical line is read: it may open with a mark
   int fMayHoldNul;       // 0 once the whole source is known to hold no NUL byte
   int64_t fSourceOffset;   // bytes the source has handed out so far
   int64_t fPendingOffset;  // where the pending line starts in the source
   int64_t fLineOffset;     // where the physical line read last starts in the source
-  // The logical line being built.
-  TextBuffer fText;      // every physical line read for it, line breaks included
-  ScanState fScan;       // carried from one physical line to the next
+  TextBuffer fText;      // every physical line read for the logical line, line breaks included
+};
+
+constexpr int kInlineLineStarts = 8;
+
+// The tokens listed for the logical line, the scanner's state, and what was measured on the
+// way. Written by the token list (token_list.cpp) alone.
+struct LineTokens {
+  ScanState fScan;            // carried from one physical line to the next
+  FormattedStrings fStrings;  // the formatted strings open in fScan's string, when it is one
   // One block: fTokenCapacity references, of which fTokenCount are owned, then as many
   // positions, fTokenPositions pointing at the first.
   PyObject** fTokenArray;
@@ -43,13 +49,20 @@ struct ReadingState {
   int fIndent;            // of the first physical line; -1 until measured
   int fTabsInIndent;
   int fSpacesInIndent;
-  int fLineIndex;         // physical line within the logical line, from 0
   int fNesting;           // open bracket depth of the listed tokens; may go negative
   int fSignificantCount;  // listed tokens that are not comments
-  int* fLineStarts;       // offset in fText of each physical line 0..fLineIndex
+  int* fLineStarts;       // offset in the text of each physical line 0..fLineIndex
   size_t fLineStartCapacity;
   int fInlineLineStarts[kInlineLineStarts];
-  FormattedStrings fStrings;  // the formatted strings open in fScan's string, when it is one
+};
+
+struct ReadingState {
+  ReadOptions fOptions;  // fixed for the call
+  SourceLines fSource;
+  LineTokens fTokens;
+  // Written by the builder (line_builder.cpp).
+  int64_t fLineNumber;   // number of the next physical line to read
+  int fLineIndex;        // physical line within the logical line, from 0
 };
 
 // Sets up a call's state for reading through readline, numbering from firstLine.
@@ -66,14 +79,7 @@ void InitBufferReading(ReadingState* state, const ReadOptions& options, const ch
 // Releases every reference and block the state holds.
 void ReleaseReadingState(ReadingState* state);
 
-// Empties the working state for the next logical line, keeping its storage.
-void StartLogicalLine(ReadingState* state);
-
 // The length of the logical line's text, which its 32-bit offsets address.
-inline int TextLength(const ReadingState* state) { return static_cast<int>(state->fText.fLength); }
-
-// Records where physical line fLineIndex starts. Returns 0, or -1 with MemoryError set.
-int NoteLineStart(ReadingState* state, int offset);
-
-// Returns the index of the physical line that holds text offset `offset`.
-int LineIndexOfOffset(const ReadingState* state, int offset);
+inline int TextLength(const ReadingState* state) {
+  return static_cast<int>(state->fSource.fText.fLength);
+}

@@ -18,7 +18,7 @@ namespace {
 // Reads logical lines into `list` until the stop line (-1: none), numbering them with `table`
 // when there is one. Returns 0, or -1.
 int ReadLines(ReadingState* state, int64_t stop, PyObject* list, ShiftTable* table) {
-  while (!(stop != -1 && state->fLineNumber >= stop) && !state->fAtEnd) {
+  while (!(stop != -1 && state->fLineNumber >= stop) && !state->fSource.fAtEnd) {
     LineParts parts;
     const int built = BuildLogicalLine(state, &parts);
     if (built < 0) return -1;

@@ -25,6 +25,7 @@
 
 #include "assembly/line_builder.h"
 #include "assembly/reading_state.h"
+#include "assembly/source_reader.h"
 #include "assembly/token_list.h"
 #include "core/py_ref.h"
 #include "lines/construction.h"
@@ -173,7 +174,7 @@ int ReRead(const ReadOptions& options, PyObject* lines, const Edit& edit, const 
   InitBufferReading(&state, options, data, from, dataEnd, start, false);
   int status = 0;
   const int64_t editEnd = edit.fFirst + edit.fNewCount;
-  while (!state.fAtEnd && status == 0) {
+  while (!state.fSource.fAtEnd && status == 0) {
     if (state.fLineNumber >= editEnd &&
         ReadsOnAsBefore(lines, state.fLineNumber, state.fLineNumber - edit.Delta()))
       break;
@@ -187,8 +188,8 @@ int ReRead(const ReadOptions& options, PyObject* lines, const Edit& edit, const 
     GiveUpTokens(&state);  // taken over by the call, whatever its outcome
     if (!line || PyList_Append(added, line.Get()) != 0) status = -1;
   }
-  *stop = state.fAtEnd ? INT64_MAX : state.fLineNumber;
-  *stopOffset = state.fPending.fLength ? state.fPendingOffset : state.fSourceOffset;
+  *stop = state.fSource.fAtEnd ? INT64_MAX : state.fLineNumber;
+  *stopOffset = NextLineOffset(&state.fSource);
   ReleaseReadingState(&state);
   return status;
 }
