@@ -75,11 +75,12 @@ CASES = [
     b"f'{f' {d}\\n' if d else ''} def {name}(x)'\n",   # the quote of the string itself
     b"x = f'({', '.join(args)})' + y\n",
     b"s = f\"{a +\n b}\" + f'{c\n}'\ny = 1\n",          # line breaks in single-quoted strings
-    b"f'{x # a comment\n  + 1}'\n",
+    b"f'{x # it's a comment, \"}\" too\n  + 1}'\n",
     b"f'{x:{width}.{precision}f} {y!r:>{w}} {z=} {z = !s:^9}'\n",
     b"f'{a!=b} {x:=5} {(x:=5)} {d[1:2]} {lambda: 1} {({1: 2})[1]}'\n",
     b"f'{{}} {{{x}}} }}{{ \\N{BULLET} {x:{y}}}}'\n",
     b"rf'\\{x}\\N{y}' Rf\"\\\"{'q'}\" fR'''{x\n}\\\\''' + 1\n",
+    b"x = rf\"\\N{'\"'}\" + 1\n",                         # no named escape in a raw string
     b'f"""{x:a\n\'b\'} {"""\ndoc"""} #{{\n"""\n',          # a line break ends a format spec
     b"f'{f'{f'{f'{1}'}'}'}' f'{\"\\\\\"}' f'{x}' 'tail'\n",
     b"print(f'caf\xc3\xa9 {\xc3\xa9t\xc3\xa9!a}', f\"{'}'}\")\n",

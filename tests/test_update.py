@@ -213,3 +213,12 @@ def test_an_empty_list_is_read_in_full():  # it proves nothing of the text it ca
     assert PARSER.UpdateLogicalLineList(lines, text, 1, 1, 1)[:2] == (0, 0)
     assert view(lines) == view(PARSER.GetLogicalLineListFromBuffer(text))
     pytest.raises(ValueError, PARSER.UpdateLogicalLineList, [], text, 2, 0, 2)  # past the text
+
+
+def test_a_byte_order_mark_counts_only_where_it_opens_the_text():
+    doc = [b"\xef\xbb\xbfq = 1\n", b"x = 1\n"]
+    lines = PARSER.GetLogicalLineListFromBuffer(b"".join(doc))
+    doc = edit(doc, lines, 0, 0, [b"y = 0\n"])  # the marked line is read again, mark and all
+    assert lines[1].fTokens[0][0].startswith("<errortoken>")
+    edit(doc, lines, 0, 1, [])  # and opens the text again
+    assert lines[0].fTokens[0] == ("q", (0, 0))
