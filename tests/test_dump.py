@@ -10,6 +10,7 @@ import pytest
 
 import logicalline
 from logicalline_dump import dump, progress, reading
+from logicalline_dump.workers import Workers
 from logicalline_dump.__main__ import PARSER_OPTIONS, main
 
 SOURCE = b"class C:\n\tdef f(self, a,\n\t\treturn '\xff'  # note\n"
@@ -158,6 +159,20 @@ def test_jobs_write_what_a_serial_run_writes(tree, capsys, monkeypatch, style):
         return status, out.buffer.getvalue().rsplit(b" MB in ", 1)[0], capsys.readouterr().err
 
     assert dump_with("--jobs", "2") == dump_with()
+
+
+@pytest.mark.parametrize("work, complaint", [
+    (lambda task: os._exit(3), r"ended early \(status 3\)"),
+    (lambda task: 1 / 0, "ZeroDivisionError"),
+])
+def test_a_worker_that_fails_is_told_not_waited_for(work, complaint):
+    workers = Workers(1, lambda: None, work)
+    pid = workers.send("task").pid
+    with pytest.raises(RuntimeError, match=complaint):
+        list(workers.answers())
+    workers.close()
+    with pytest.raises(ChildProcessError):  # it has ended and been waited for
+        os.waitpid(pid, os.WNOHANG)
 
 
 @pytest.mark.parametrize("terminal, shown", [(False, False), (True, True)])
