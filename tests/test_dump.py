@@ -146,6 +146,7 @@ def test_windows_give_what_one_read_gives(window):
 @pytest.mark.parametrize("style", [["--json"], [], ["--summary"]])
 def test_jobs_write_what_a_serial_run_writes(tree, capsys, monkeypatch, style):
     monkeypatch.setattr(dump, "CHUNK", 20000)  # many tasks of a few files
+    monkeypatch.setattr(dump, "SMALLEST", 5000)
     for number in range(12):  # sizes that make the workers finish out of order
         pathlib.Path(f"f{number}.py").write_bytes(CLOSED * (number % 5) * 100)
     inputs = ["nul.py", "ok.py", ".", "-", "bad.py", "missing.py"]
@@ -183,6 +184,8 @@ def test_progress_only_on_a_terminal(tree, capsys, monkeypatch, terminal, shown)
     assert ("/2 files" in err) == shown and run(capsys, "-q", "ok.py", "bad.py")[2] == ""
 
 
+@pytest.mark.skipif("asan" in os.environ.get("LD_PRELOAD", ""),
+                    reason="the sanitizer keeps what is freed, to catch its use")
 def test_memory_does_not_grow_with_the_file(tmp_path):
     # The whole file's lines would take about a hundred times its size; streamed, the growth
     # is the file's bytes and an index of its lines. Both files fill many windows. The child's

@@ -16,9 +16,11 @@ from .workers import Workers
 # Tokens per write of one line's tokens: a line of millions of them is written in parts, so that
 # its output never stands whole in memory.
 PIECE = 4096
-# Bytes of source per task of a worker process at most (a bigger file is a task of its own);
-# smaller for small inputs, so that every worker gets several tasks.
+# Bytes of source per task of a worker process, at most and at least (a bigger file is a task
+# of its own): large enough that a task's own cost vanishes, smaller towards the end, so that
+# the workers finish together.
 CHUNK = 1 << 20
+SMALLEST = 1 << 17
 
 # Line type constants by their bytes value, for printing.
 LINE_TYPE_NAMES = {
@@ -141,9 +143,9 @@ def dump_file(parser, style, path, emit, moved=lambda size: None):
 
 
 def tasks(sources, sizes, jobs):
-    """Splits the inputs, in order, into runs of consecutive files of about CHUNK bytes, fewer
-    for a small total so that each worker gets several; stdin is a run of its own."""
-    target = max(1, min(CHUNK, sum(sizes) // (4 * jobs)))
+    """Splits the inputs, in order, into runs of consecutive files, each of about a quarter of
+    what is left per worker, between SMALLEST and CHUNK bytes; stdin is a run of its own."""
+    left = sum(sizes)
     start = weight = 0
     for index, (path, size) in enumerate(zip(sources, sizes)):
         if path == STDIN:
@@ -153,8 +155,9 @@ def tasks(sources, sizes, jobs):
             start, weight = index + 1, 0
             continue
         weight += size
-        if weight >= target:
+        if weight >= max(SMALLEST, min(CHUNK, left // (4 * jobs))):
             yield start, index + 1
+            left -= weight
             start, weight = index + 1, 0
     if start < len(sources):
         yield start, len(sources)
