@@ -3,6 +3,7 @@ up another: no imports or set-up beyond the fork, and a few bytes of pickle per 
 A worker starts with everything this process holds at the fork, so a task can be a few numbers
 that point into it."""
 
+import gc
 import os
 import pickle
 import select
@@ -58,33 +59,48 @@ def serve(tasks, answers, start, work):
         send(answers, answer)
 
 
+def run_worker(tasks, answers, unused, start, work):
+    """The life of a forked worker, which never returns into its parent's code."""
+    status = 1
+    try:
+        # Ctrl-C is for the parent, which ends the workers on its way out.
+        signal.signal(signal.SIGINT, signal.SIG_IGN)
+        # Only its own pipe ends stay open, so that each pipe ends when its one reader or
+        # writer does.
+        for fd in unused:
+            os.close(fd)
+        serve(tasks, answers, start, work)
+        status = 0
+    finally:
+        os._exit(status)
+
+
 class Workers:
     """`count` processes that run work(task) on each task they are sent, in the order sent,
     after start() once. close() ends them, waiting for them on the way."""
 
     def __init__(self, count, start, work):
         self.workers = []
-        for _ in range(count):
-            tasks_read, tasks_write = os.pipe()
-            answers_read, answers_write = os.pipe()
-            pid = os.fork()
-            if pid == 0:  # the worker: it never returns into its parent's code
-                status = 1
-                try:
-                    # Ctrl-C is for the parent, which ends the workers on its way out.
-                    signal.signal(signal.SIGINT, signal.SIG_IGN)
-                    # Only this worker's own ends stay open, so that each pipe ends when its
-                    # one reader or writer does.
-                    for fd in [tasks_write, answers_read] + [
-                            fd for worker in self.workers for fd in (worker.tasks, worker.answers)]:
-                        os.close(fd)
-                    serve(tasks_read, answers_write, start, work)
-                    status = 0
-                finally:
-                    os._exit(status)
-            os.close(tasks_read)
-            os.close(answers_write)
-            self.workers.append(Worker(pid, tasks_write, answers_read))
+        # What exists now is set aside from the collector, so that a worker's collections do
+        # not walk, and so copy, the pages that it shares with this process.
+        gc.freeze()
+        try:
+            for _ in range(count):
+                self.workers.append(self.spawn(start, work))
+        finally:
+            gc.unfreeze()
+
+    def spawn(self, start, work):
+        tasks_read, tasks_write = os.pipe()
+        answers_read, answers_write = os.pipe()
+        pid = os.fork()
+        if pid == 0:
+            others = [fd for worker in self.workers for fd in (worker.tasks, worker.answers)]
+            run_worker(tasks_read, answers_write, [tasks_write, answers_read, *others], start,
+                       work)
+        os.close(tasks_read)
+        os.close(answers_write)
+        return Worker(pid, tasks_write, answers_read)
 
     def send(self, task):
         """Sends the task to the worker with the fewest pending; returns that worker."""
