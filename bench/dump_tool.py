@@ -116,7 +116,7 @@ def run_memory(corpus):
             peak = peak_bytes(MODULE_PEAK, [dense, tokens])
             print(f"{'the module alone, one dense line':<34} {label:<10} {peak / MB:>8.1f} "
                   f"{(peak - base) / MB:>10.1f} {(peak - base) / DENSE_BYTES:>8.1f}")
-    print(f"(peak: VmHWM of a run with --jobs 1; growth: the peak less that of the same run "
-          f"on an empty file; B per B: growth per byte of the biggest input file; the module "
-          f"alone: the lines of GetLogicalLineListFromBuffer on the file, then with every line's fTokens)")
+    print("(peak: VmHWM of a run with --jobs 1; growth: the peak less that of the same run on an "
+          "empty file; B per B: growth per byte of the biggest input file; the module alone: the "
+          "lines of GetLogicalLineListFromBuffer on the file, then with every line's fTokens)")
     return worst
