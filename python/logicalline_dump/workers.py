@@ -39,12 +39,13 @@ def receive(fd):
 
 class Worker:
     def __init__(self, pid, tasks, answers):
-        self.pid, self.tasks, self.answers = pid, tasks, answers
+        self.pid = pid  # None once the process has been waited for
+        self.tasks, self.answers = tasks, answers  # this process's ends of the two pipes
         self.pending = 0  # tasks sent and not yet answered
 
 
 def serve(tasks, answers, start, work):
-    """The life of a worker: start(), then work(task) for each task until the pipe closes."""
+    """Runs start(), then work(task) for each task that comes, until the pipe closes."""
     start()
     while True:
         try:
