@@ -3,6 +3,7 @@
 # a package index accepts, and an sdist, all into dist/. Each is installed into a fresh virtual
 # environment with the test extras and the suite runs against it: the wheels from the repository
 # root, the sdist from its own unpacked tree, which shows that it carries what the tests read.
+# Each must carry the licence (tools/check_licence.py).
 # Usage: bash .ci/wheels.sh [python3.X ...]   (the first one also builds and tests the sdist)
 set -euo pipefail
 cd "$(dirname "$0")/.."
@@ -31,6 +32,7 @@ for python in "${pythons[@]}"; do
   fi
   wheel="$(ls dist/logicalline-*-"$tag"-*manylinux*.whl)"
   echo "$wheel"
+  "$python" tools/check_licence.py "$wheel"
   "$python" -m venv "$work/$tag"
   "$work/$tag/bin/python" -m pip install --quiet "$wheel[test]"
   # From the repository root, so the tests and examples are at hand; the module and its stub
@@ -47,6 +49,7 @@ if ! "$work/tools/bin/python" -m build --sdist --outdir dist . >"$work/build.log
 fi
 sdist="$(ls dist/logicalline-*.tar.gz)"
 echo "$sdist"
+"${pythons[0]}" tools/check_licence.py "$sdist"
 "${pythons[0]}" -m venv "$work/sdist"
 "$work/sdist/bin/python" -m pip install --quiet "$sdist[test]"
 mkdir "$work/src"

@@ -1,7 +1,8 @@
 """Speed and memory of logicalline against the tools a host would otherwise use.
 
-    python3.10 bench/compare.py [CORPUS_DIR] [--runs N] [--slow-runs N]
+    python3.10 bench/compare.py [CORPUS_DIR] [--runs N] [--slow-runs N] [--check]
     python3.10 bench/compare.py [CORPUS_DIR] --ops [--runs N]
+    python3.10 bench/compare.py [CORPUS_DIR] --dump [--runs N] [--check]
 
 The corpus is read into memory before anything is timed. Without CORPUS_DIR it is every .py file
 of the running interpreter's standard library (the directory of os.__file__), leaving out
@@ -27,10 +28,17 @@ each marked with the section its figure comes from.
 doing the same bookkeeping, whose tokens are classified by the test suite's model
 (tests/model.py).
 
+--dump runs the dump tool (python3 -m logicalline_dump) on the corpus: wall and CPU time with
+--jobs 1, 2 and 0 for each output, and its peak memory per byte of input on a 10 MB file of one
+dense line and on the corpus; then its targets.
+
+--check makes the exit status 1 when a target is not met (an aim is no target); without it the
+status is 0 whatever the figures.
+
 This file is the entry point and holds the default mode and its targets; corpus.py loads the
 corpus, contenders.py holds the timed bodies and the timing helpers, scaling.py the shapes of
-source, memory.py the retained memory, updates.py the editor updates, and host_ops.py the --ops
-table.
+source, memory.py the retained memory, updates.py the editor updates, host_ops.py the --ops
+table, and dump_tool.py the --dump runs.
 
 Timing rules: time.perf_counter; gc.collect() runs between runs, outside the timed region; the
 cyclic collector stays enabled while a contender runs, as it would in a host. Fast contenders
@@ -51,6 +59,7 @@ from contenders import (ast_body, floor_body, floor_census, load_text, logicalli
                         progress, time_contender, tokenize_body, tree_sitter_body,
                         tree_sitter_parser)
 from corpus import MB, default_corpus, load_corpus
+from dump_tool import run_jobs, run_memory
 from host_ops import run_ops
 from memory import measure_memory, measure_tokenize_memory, print_memory
 from scaling import run_scaling
@@ -59,6 +68,9 @@ from updates import run_updates
 
 # ---------------------------------------------------------------------------------------------
 # Targets
+
+
+MISSED = []  # labels of the targets not met, for --check
 
 
 def check(label, value, limit, aim=None, at_most=False, unit="x"):
@@ -70,6 +82,8 @@ def check(label, value, limit, aim=None, at_most=False, unit="x"):
     shown = f"{value:>6.2f}" if value < 10 else f"{value:>6.1f}"  # 1.26 must not read as 1.3
     print(f"  {label:<60} {shown}{unit}  ({relation} {limit}{unit}: "
           f"{'MET' if meets(limit) else 'NOT MET'}{aim_text})")
+    if not meets(limit):
+        MISSED.append(label)
 
 
 def speedup(other, own):
@@ -187,6 +201,33 @@ def run_comparison(corpus, runs, slow_runs):
 
 
 # ---------------------------------------------------------------------------------------------
+# --dump
+
+# Bounds that --help of the dump tool states: its peak memory growth per byte of the biggest
+# input file, on one dense line and on an ordinary tree.
+DUMP_DENSE_BYTES_PER_BYTE = 105
+DUMP_TREE_BYTES_PER_BYTE = 20
+
+
+def run_dump(corpus, runs):
+    print(f"== The dump tool: --jobs ({runs} runs; load average now {load_text()}) ==")
+    times = run_jobs(corpus, runs)
+    print("\n== The dump tool: peak memory ==")
+    worst = run_memory(corpus)
+    print("\n== Targets ==")
+    for style in ("text", "--json", "--summary"):
+        (wall1, cpu1), (wall2, cpu2) = times[style, 1], times[style, 2]
+        check(f"[jobs] {style}: -j 2 total CPU over -j 1's", cpu2 / cpu1, 1.1, at_most=True)
+        if os.cpu_count() >= 2:
+            check(f"[jobs] {style}: -j 2 wall time over -j 1's (idle 2 cores)", wall2 / wall1,
+                  0.6, at_most=True)
+    check("[memory] one dense line: peak growth per input byte", worst["dense"],
+          DUMP_DENSE_BYTES_PER_BYTE, at_most=True, unit=" B")
+    check("[memory] the corpus: peak growth per byte of its biggest file", worst["tree"],
+          DUMP_TREE_BYTES_PER_BYTE, at_most=True, unit=" B")
+
+
+# ---------------------------------------------------------------------------------------------
 
 
 def main():
@@ -194,8 +235,13 @@ def main():
     arguments.add_argument("corpus", nargs="?", help="directory of .py files (default: the "
                            "standard library of this interpreter)")
     arguments.add_argument("--ops", action="store_true", help="time the host operations")
-    arguments.add_argument("--runs", type=int, default=7,
-                           help="runs of the fast contenders, the scaling cases and --ops")
+    arguments.add_argument("--dump", action="store_true",
+                           help="time the dump tool with --jobs and measure its peak memory")
+    arguments.add_argument("--check", action="store_true",
+                           help="exit with status 1 when a target is not met")
+    arguments.add_argument("--runs", type=int,
+                           help="runs of the fast contenders, the scaling cases and --ops "
+                           "(default: 7), and of each --dump case (default: 3)")
     arguments.add_argument("--slow-runs", type=int, default=3,
                            help="runs of tokenize, ast.parse and parso")
     options = arguments.parse_args()
@@ -217,9 +263,13 @@ def main():
           f"load average at start {load_text()} (other work on the machine slows every "
           "contender alike, so the ratios hold better than the seconds)\n")
     if options.ops:
-        run_ops(corpus, options.runs)
+        run_ops(corpus, options.runs or 7)
+    elif options.dump:
+        run_dump(corpus, options.runs or 3)
     else:
-        run_comparison(corpus, options.runs, options.slow_runs)
+        run_comparison(corpus, options.runs or 7, options.slow_runs)
+    if options.check and MISSED:
+        sys.exit(f"{len(MISSED)} target(s) not met: {'; '.join(MISSED)}")
 
 
 if __name__ == "__main__":

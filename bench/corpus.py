@@ -11,8 +11,9 @@ SKIPPED_DIRS = {"site-packages", "dist-packages", "__pycache__"}
 class Corpus:
     """Source files held as bytes, with the tallies printed at the top of a run."""
 
-    def __init__(self, root, sources, unreadable):
+    def __init__(self, root, paths, sources, unreadable):
         self.root = root
+        self.paths = paths  # of the files read, in the order of sources
         self.sources = sources
         self.unreadable = unreadable
         self.size = sum(map(len, sources))
@@ -30,14 +31,16 @@ def load_corpus(root, skip_installed):
             subdirs[:] = [d for d in subdirs if d not in SKIPPED_DIRS]
         subdirs.sort()
         paths.extend(os.path.join(directory, n) for n in sorted(names) if n.endswith(".py"))
-    sources, unreadable = [], 0
+    read, sources, unreadable = [], [], 0
     for path in paths:
         try:
             with open(path, "rb") as f:
                 sources.append(f.read())
         except OSError:
             unreadable += 1
-    return Corpus(root, sources, unreadable)
+        else:
+            read.append(path)
+    return Corpus(root, read, sources, unreadable)
 
 
 def default_corpus():

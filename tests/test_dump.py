@@ -1,4 +1,6 @@
+import io
 import json
+import os
 import pathlib
 import socket
 import subprocess
@@ -8,6 +10,7 @@ import pytest
 
 import logicalline
 from logicalline_dump import dump, progress, reading
+from logicalline_dump.workers import Workers
 from logicalline_dump.__main__ import PARSER_OPTIONS, main
 
 SOURCE = b"class C:\n\tdef f(self, a,\n\t\treturn '\xff'  # note\n"
@@ -32,6 +35,15 @@ def run(capsys, *argv):
     return (main(list(argv)), *capsys.readouterr())
 
 
+def strict_records(out):
+    """The JSON records of out, each of which a strict parser accepts: valid UTF-8 text, so no
+    lone surrogate, even escaped."""
+    records = [json.loads(row) for row in out.splitlines()]
+    for record in records:
+        json.dumps(record, ensure_ascii=False).encode("utf-8")
+    return records
+
+
 @pytest.mark.parametrize("argv, status, complaint", [
     (["ok.py", "bad.py"], 0, ""),
     (["ok.py", "empty"], 1, "no .py files in empty"),
@@ -48,8 +60,8 @@ def test_exit_status(tree, capsys, argv, status, complaint):
 @pytest.mark.parametrize("style, head, tail", [
     ([], "== ok.py\n    1 +1   indent 0   -                  kAssignment\n",
      "'x'@1:0  '='@1:2  '1'@1:4\n"),
-    (["--json"], '{"path": "missing.py", "error": ',
-     '"tokens": [["x", 1, 0], ["=", 1, 2], ["1", 1, 4]]}\n'),
+    (["--json"], '{"path": "missing.py", "logical_lines": 0, "error": ',
+     '"tokens": [["x", 1, 0], ["=", 1, 2], ["1", 1, 4]]}\n{"path": "ok.py", "logical_lines": 1}\n'),
     (["--summary"], "kAssignment                  1\n", "; 3 failed\n"),
 ])
 def test_failures_are_reported_in_order_and_the_rest_still_dumped(tree, capsys, style, head,
@@ -64,12 +76,61 @@ def test_failures_are_reported_in_order_and_the_rest_still_dumped(tree, capsys, 
 
 @pytest.mark.parametrize("data", [
     "# -*- coding: latin-1 -*-\ns = 'café'\n".encode("latin-1"),
+    "#!/usr/bin/env python\n# vim: set fileencoding=cp1252 :\ns = 'café'\n".encode("cp1252"),
+    "# coding: latin-1, é\ns = 'café'\n".encode("latin-1"),  # the declaration line not UTF-8
     b"\xef\xbb\xbfs = 'caf\xc3\xa9'\n",  # UTF-8 with a byte-order mark
+    b"\xef\xbb\xbf# coding: UTF_8\ns = 'caf\xc3\xa9'\n",  # one that agrees with it
 ])
 def test_text_is_decoded_as_the_interpreter_would(tmp_path, capsys, data):
     (tmp_path / "x.py").write_bytes(data)
     _, out, _ = run(capsys, "--json", str(tmp_path / "x.py"))
-    assert json.loads(out)["tokens"][2] == ["'café'", data.count(b"\n"), 4]
+    assert json.loads(out.splitlines()[0])["tokens"][2] == ["'café'", data.count(b"\n"), 4]
+
+
+LATE_NUL = b"x = 1\n" * 20000 + b"y\x00\n"  # the second window fails
+
+
+@pytest.mark.parametrize("name, data, lines, error", [
+    (b"empty.py", b"", 0, None),
+    (b"comment.py", b"# only a note\n\n", 0, None),
+    (b"caf\xe9.py", b"x = 1\n", 1, None),  # a name that is not UTF-8
+    (b"nul.py", b"x = 1\ny\x00\n", 0, "Binary data encountered at lineno 2 while tokenizing"),
+    (b"late.py", LATE_NUL, 20000, "Binary data encountered at lineno 20001 while tokenizing"),
+    (b"typo.py", b"# -*- coding: uft-8 -*-\nx = 1\n", 0, "unknown encoding: uft-8"),
+    (b"bom.py", b"\xef\xbb\xbf# coding: latin-1\nx = 1\n", 0,
+     "encoding problem: latin-1 with BOM"),
+    (b"hex.py", b"#!/bin/python\n# coding: hex\n", 0,
+     "'hex' is not a text encoding; use codecs.decode() to handle arbitrary codecs"),
+])
+def test_every_file_closes_with_a_record(tmp_path, capsys, name, data, lines, error):
+    path = os.path.join(os.fsencode(tmp_path), name)
+    with open(path, "wb") as handle:
+        handle.write(data)
+    for jobs in ("1", "2"):
+        status, out, err = run(capsys, "--json", "--jobs", jobs, os.fsdecode(path))
+        *records, closing = strict_records(out)
+        assert bytes.fromhex(closing.get("path_hex", "")) == (path if b"\xe9" in name else b"")
+        assert closing["path"].endswith(name.decode("utf-8", "backslashreplace"))
+        assert all(record["path"] == closing["path"] for record in records)
+        assert closing["logical_lines"] == len(records) == lines
+        assert closing.get("error") == (error and f"{closing['path']}: {error}")
+        assert status == bool(error) and (error or "") in err
+    if not error:  # the text names the file as the JSON does
+        assert run(capsys, os.fsdecode(path))[1].startswith(f"== {closing['path']}\n")
+
+
+@pytest.mark.parametrize("style", [[], ["--json"]])
+def test_a_line_written_in_parts_is_written_whole(tmp_path, capsys, monkeypatch, style):
+    (tmp_path / "x.py").write_bytes(CLOSED + b"z = [" + b"1, " * 50 + b"]\n")
+    whole = run(capsys, *style, str(tmp_path / "x.py"))
+    monkeypatch.setattr(dump, "PIECE", 3)
+    assert run(capsys, *style, str(tmp_path / "x.py")) == whole
+
+
+def test_help_fits_80_columns(capsys, monkeypatch):
+    monkeypatch.setenv("COLUMNS", "80")
+    assert main(["--help"]) == 0
+    assert max(map(len, capsys.readouterr().out.splitlines())) <= 80
 
 
 @pytest.mark.parametrize("window", [1, 2, 3, 5, 100])
@@ -82,13 +143,37 @@ def test_windows_give_what_one_read_gives(window):
             (x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in whole]
 
 
-@pytest.mark.parametrize("style", [["--json"], []])
+@pytest.mark.parametrize("style", [["--json"], [], ["--summary"]])
 def test_jobs_write_what_a_serial_run_writes(tree, capsys, monkeypatch, style):
-    monkeypatch.setattr(dump, "BIG", 20000)  # the bigger files stream from this process
+    monkeypatch.setattr(dump, "CHUNK", 20000)  # many tasks of a few files
+    monkeypatch.setattr(dump, "SMALLEST", 5000)
     for number in range(12):  # sizes that make the workers finish out of order
         pathlib.Path(f"f{number}.py").write_bytes(CLOSED * (number % 5) * 100)
-    inputs = ["nul.py", "ok.py", ".", "bad.py", "missing.py"]
-    assert run(capsys, *style, "--jobs", "2", *inputs) == run(capsys, *style, *inputs)
+    inputs = ["nul.py", "ok.py", ".", "-", "bad.py", "missing.py"]
+
+    def dump_with(*jobs):
+        monkeypatch.setattr(sys, "stdin", io.TextIOWrapper(io.BytesIO(SPANNING)))
+        out = io.TextIOWrapper(io.BytesIO(), "utf-8")  # holding text back, as a file's does
+        monkeypatch.setattr(sys, "stdout", out)
+        status = main([*style, *jobs, *inputs])
+        # A summary ends with the time taken.
+        return status, out.buffer.getvalue().rsplit(b" MB in ", 1)[0], capsys.readouterr().err
+
+    assert dump_with("--jobs", "2") == dump_with()
+
+
+@pytest.mark.parametrize("work, complaint", [
+    (lambda task: os._exit(3), r"ended early \(status 3\)"),
+    (lambda task: 1 / 0, "ZeroDivisionError"),
+])
+def test_a_worker_that_fails_is_told_not_waited_for(work, complaint):
+    workers = Workers(1, lambda: None, work)
+    pid = workers.send("task").pid
+    with pytest.raises(RuntimeError, match=complaint):
+        list(workers.answers())
+    workers.close()
+    with pytest.raises(ChildProcessError):  # it has ended and been waited for
+        os.waitpid(pid, os.WNOHANG)
 
 
 @pytest.mark.parametrize("terminal, shown", [(False, False), (True, True)])
@@ -99,11 +184,14 @@ def test_progress_only_on_a_terminal(tree, capsys, monkeypatch, terminal, shown)
     assert ("/2 files" in err) == shown and run(capsys, "-q", "ok.py", "bad.py")[2] == ""
 
 
+@pytest.mark.skipif("asan" in os.environ.get("LD_PRELOAD", ""),
+                    reason="the sanitizer keeps what is freed, to catch its use")
 def test_memory_does_not_grow_with_the_file(tmp_path):
     # The whole file's lines would take about a hundred times its size; streamed, the growth
-    # is the file's bytes and an index of its lines. Both files fill many windows.
-    child = ("import resource, sys; from logicalline_dump.__main__ import main; main(sys.argv[1:]);"
-             " sys.stderr.write(str(resource.getrusage(resource.RUSAGE_SELF).ru_maxrss))")
+    # is the file's bytes and an index of its lines. Both files fill many windows. The child's
+    # own high-water mark: its ru_maxrss would start at that of this process.
+    child = ("import sys; from logicalline_dump.__main__ import main; main(sys.argv[1:]); sys."
+             "stderr.write([row for row in open('/proc/self/status') if 'VmHWM' in row][0][6:-3])")
     peak_kb, path = [], tmp_path / "x.py"
     for count in (2500, 10000):
         path.write_bytes(CLOSED * count)

@@ -1,17 +1,39 @@
-"""Reading inputs for the dump: finding the sources, decoding them to the UTF-8 that the module
-reads, and reading a file's logical lines in windows so that no whole file's lines are held."""
+"""Reading inputs for the dump: finding the sources and naming them, decoding them to the UTF-8
+that the module reads, and reading a file's logical lines in windows so that no whole file's
+lines are held."""
 
 import array
-import io
+import codecs
 import os
 import re
 import sys
-import tokenize
 
 STDIN = "-"
+BOM = b"\xef\xbb\xbf"
+# A coding declaration as the interpreter finds it: a comment on the first line, or on the second
+# after a first line that is blank or a comment. Matched on bytes, as the interpreter matches it,
+# so that other bytes on that line need not be UTF-8.
+DECLARATION = re.compile(rb"[ \t\f]*#.*?coding[:=][ \t]*([-\w.]+)", re.ASCII)
+BLANK = re.compile(rb"[ \t\f]*(?:[#\r\n]|$)", re.ASCII)
 # Physical lines per window: enough that the call overhead vanishes, few enough that a window's
 # LogicalLine objects stay a few megabytes whatever the file size.
 WINDOW = 20000
+
+
+def path_fields(path):
+    """The fields that name an input in a JSON record: "path", text that is valid UTF-8, and for a
+    name that is not UTF-8 "path_hex" too, the hex of its bytes, from which it is recovered."""
+    try:
+        path.encode("utf-8")
+    except UnicodeEncodeError:  # the bytes that the name could not decode to, kept as surrogates
+        raw = os.fsencode(path)
+        return {"path": raw.decode("utf-8", "backslashreplace"), "path_hex": raw.hex()}
+    return {"path": path}
+
+
+def shown(path):
+    """An input's name in text output and messages: as in the "path" of its JSON records."""
+    return path_fields(path)["path"]
 
 
 def find_sources(paths, fail):
@@ -21,7 +43,7 @@ def find_sources(paths, fail):
 
     def unlistable(error):
         unlisted.append(error.filename)
-        fail(error.filename, f"cannot read {error.filename}: {error.strerror or error}")
+        fail(error.filename, f"cannot read {shown(error.filename)}: {error.strerror or error}")
 
     for path in paths:
         if path == STDIN or not os.path.isdir(path):
@@ -33,7 +55,7 @@ def find_sources(paths, fail):
             sources.extend(os.path.join(root, name) for name in sorted(files)
                            if name.endswith(".py"))
         if len(sources) == found and len(unlisted) == failed:  # an unlistable one is told once
-            fail(path, f"no .py files in {path}")
+            fail(path, f"no .py files in {shown(path)}")
     return sources
 
 
@@ -47,16 +69,56 @@ def load(path):
         return handle.read()
 
 
+def declared_encoding(data, start):
+    """Returns the encoding that a declaration on the first two lines of data[start:] names, as
+    written, or None."""
+    for _ in range(2):
+        end = data.find(b"\n", start)
+        end = len(data) if end < 0 else end + 1
+        match = DECLARATION.match(data, start, end)
+        if match:
+            return match.group(1).decode("ascii")
+        if not BLANK.match(data, start, end):
+            return None
+        start = end
+    return None
+
+
+def normal_name(name):
+    """The interpreter's own spelling of the UTF-8 and Latin-1 names; others stay as written."""
+    lowered = name[:12].lower().replace("_", "-")
+    if lowered == "utf-8" or lowered.startswith("utf-8-"):
+        return "utf-8"
+    if lowered in ("latin-1", "iso-8859-1", "iso-latin-1") or lowered.startswith(
+            ("latin-1-", "iso-8859-1-", "iso-latin-1-")):
+        return "iso-8859-1"
+    return name
+
+
 def to_utf8(data):
-    """Decodes data as the interpreter would (byte-order mark, coding declaration) and returns it
-    as UTF-8, which is all the module reads."""
+    """Decodes data as the interpreter would (byte-order mark, coding declaration, else UTF-8)
+    and returns it as UTF-8, which is all the module reads. A declaration that the interpreter
+    refuses raises ValueError with the interpreter's message. Bytes that do not decode stay
+    malformed in UTF-8 and become U+FFFD in another encoding, so that the module reads on."""
+    bom = data.startswith(BOM)
+    name = declared_encoding(data, len(BOM) if bom else 0)
+    if name is None or normal_name(name) == "utf-8":
+        return data  # the module skips a byte-order mark
+    if bom:
+        raise ValueError(f"encoding problem: {name} with BOM")
     try:
-        encoding, _ = tokenize.detect_encoding(io.BytesIO(data).readline)
-    except SyntaxError:  # an unknown codec, or first lines that are not UTF-8: keep the bytes
-        return data
-    if encoding == "utf-8":
-        return data  # malformed bytes stay, for the module to show as U+FFFD
-    return data.decode(encoding, "replace").encode()  # "utf-8-sig" drops the byte-order mark
+        if codecs.lookup(name).name == "utf-8":
+            return data
+    except LookupError:
+        raise ValueError(f"unknown encoding: {name}") from None
+    try:
+        try:
+            text = data.decode(name)
+        except UnicodeDecodeError:
+            text = data.decode(name, "replace")
+    except (LookupError, UnicodeError) as error:  # not a text encoding, or one that reads nothing
+        raise ValueError(str(error) or f"cannot decode with {name}") from None
+    return text.encode()
 
 
 def read_lines(parser, data, offset, first_line, line_count):
