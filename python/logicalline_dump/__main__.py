@@ -51,8 +51,8 @@ busy it gained 3%.
 Memory: one file is read at a time, in windows of 20,000 physical lines, and
 each logical line is written in turn and then released. Measured on Python
 3.10 and 3.13, the peak grew by at most 20 bytes per byte of the biggest file
-when dumping the standard library, and by at most 105 per byte for a 10 MB
-file of one line of 3.3 million numbers, 101 of them the module's own tokens
+when dumping the standard library, and by at most 130 per byte for a 10 MB
+file of one line of 3.3 million numbers, 125 of them the module's own tokens
 of that line. Each --jobs worker holds as much for the files it reads.
 
 On a terminal a run longer than a second shows its progress on stderr (files
