@@ -110,9 +110,9 @@ def print_targets(speed, memory_per_token, scaling_worst, update_ratio):
                        ("buffer", "buffer, parse")):
         check(f"[scaling] worst case per MB, {name}", scaling_worst[path], 2, at_most=True)
     if update_ratio is None:
-        print("  [editor updates] one-character edit, 10,000 lines: not measured")
+        print("  [editor updates] one-character edit, 100,000 lines: not measured")
     else:
-        check("[editor updates] one-character edit, 10,000 lines, faster by", update_ratio, 50)
+        check("[editor updates] one-character edit, 100,000 lines, faster by", update_ratio, 50)
 
 
 # ---------------------------------------------------------------------------------------------
