@@ -61,18 +61,17 @@ bool IsSharedToken(PyObject* token) {
   if (n <= 1) return true;
   if (n > kCachedTextLimit) return false;
   const int id = TokenIdForStart(&kOperatorTable, text.fBytes, text.fBytes + n);
-  if (id != NAME_TOKEN)
-    return gFixedTexts.Holds(static_cast<size_t>(id),
-                             [token](const ObjectSlot& slot) { return slot.fObject == token; });
+  if (id != NAME_TOKEN) {
+    const ObjectSlot* fixed = gFixedTexts.At(static_cast<size_t>(id));
+    return fixed && fixed->fObject == token;
+  }
   // A token object has nothing readable past its text: its head is read a byte at a time.
   return gTokenTexts.Holds(TextSetOf(HeadWord(text.fBytes, n), TailWord(text.fBytes, n), n),
                            [token](const TextSlot& slot) { return slot.fBytes == token; });
 }
 
 PyObject* CachedFixedText(int id) {
-  const ObjectSlot* known = gFixedTexts.Find(static_cast<size_t>(id), [](const ObjectSlot&) {
-    return true;
-  });
+  const ObjectSlot* known = gFixedTexts.At(static_cast<size_t>(id));
   return known ? Py_NewRef(known->fObject) : nullptr;
 }
 

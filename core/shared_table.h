@@ -51,6 +51,14 @@ class SharedTable {
     return nullptr;
   }
 
+  // Returns the slot of a table with one way to a set, which its key indexes directly, or
+  // nullptr while it is empty.
+  const Slot* At(size_t set) const {
+    static_assert(kWays == 1, "a key indexes one slot only where a set has one way");
+    const Slot& slot = fSets[set].fWays[0];
+    return slot.Full() ? &slot : nullptr;
+  }
+
   // Whether set `set` has a full slot for which matches(slot) holds; the order stays.
   template <typename Match>
   bool Holds(size_t set, Match matches) const {

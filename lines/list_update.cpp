@@ -108,19 +108,13 @@ ShiftTable* Regroup(PyObject* lines) {
   return table;
 }
 
-// The table that numbers the list, with a hold for the caller: the one its lines share, while
-// the list holds exactly what the last read or update left in it; regrouped when edits have
-// split its groups so finely that moving them would cost more than numbering them again. An
-// empty list gets a new table, and is read in full. A list changed since is refused: nothing
-// short of reading the text again would prove that its lines still fit it. Returns nullptr
-// with an exception set.
+// The table that numbers a list that is not empty, with a hold for the caller: the one its
+// lines share, while the list holds exactly what the last read or update left in it; regrouped
+// when edits have split its groups so finely that moving them would cost more than numbering
+// them again. A list changed since is refused: nothing short of reading the text again would
+// prove that its lines still fit it. Returns nullptr with an exception set.
 ShiftTable* TableFor(PyObject* lines) {
   const Py_ssize_t size = PyList_GET_SIZE(lines);
-  if (size == 0) {
-    ShiftTable* table = NewShiftTable();
-    if (!table) PyErr_NoMemory();
-    return table;
-  }
   const PyObject* first = PyList_GET_ITEM(lines, 0);
   ShiftTable* table =
       Py_TYPE(first) == &LogicalLineType ? AsLine(const_cast<PyObject*>(first))->fShiftTable
@@ -310,20 +304,24 @@ PyObject* UpdateNumbered(const ReadOptions& options, PyObject* lines, ShiftTable
 
 PyObject* UpdateLineList(const ReadOptions& options, PyObject* lines, const Edit& edit,
                          const char* data, const char* end) {
-  Edit whole = edit;
-  if (PyList_GET_SIZE(lines) == 0) {
-    // An empty list proves nothing about the text it came from: the new text is read in full,
-    // as an edit of all of it.
-    int64_t total = 0;
-    SkipLines(data, end, INT64_MAX, &total);
-    if (edit.fFirst + edit.fNewCount > total) {
-      PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
-      return nullptr;
-    }
-    whole = Edit{.fFirst = 0, .fOldCount = 0, .fNewCount = total};
+  if (PyList_GET_SIZE(lines) > 0) {
+    ShiftTable* table = TableFor(lines);
+    if (!table) return nullptr;
+    PyObject* result = UpdateNumbered(options, lines, table, edit, data, end);
+    DropShiftTable(table);
+    return result;
   }
-  ShiftTable* table = TableFor(lines);
-  if (!table) return nullptr;
+  // An empty list proves nothing about the text it came from: the new text is read in full, as
+  // an edit of all of it, into a new numbering.
+  int64_t total = 0;
+  SkipLines(data, end, INT64_MAX, &total);
+  if (edit.fFirst + edit.fNewCount > total) {
+    PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
+    return nullptr;
+  }
+  ShiftTable* table = NewShiftTable();
+  if (!table) return PyErr_NoMemory();
+  const Edit whole{.fFirst = 0, .fOldCount = 0, .fNewCount = total};
   PyObject* result = UpdateNumbered(options, lines, table, whole, data, end);
   DropShiftTable(table);
   return result;

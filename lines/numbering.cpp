@@ -31,13 +31,13 @@ int SealNumbering(ShiftTable* table, PyObject* list) {
     PyErr_NoMemory();
     return -1;
   }
-  RecordItems(table, list, ItemsOf(list), count);
+  RecordItems(table, list, 0, table->fItemCount, ItemsOf(list), count);
   return 0;
 }
 
 void SealReplacedLines(ShiftTable* table, PyObject* list, size_t index, size_t removed,
                        size_t added) {
-  RecordReplacedItems(table, list, index, removed, ItemsOf(list) + index, added);
+  RecordItems(table, list, index, removed, ItemsOf(list) + index, added);
 }
 
 bool ListIsAsNumbered(const ShiftTable* table, PyObject* list) {

@@ -10,8 +10,8 @@ ShiftTable* NewShiftTable() {
   auto* table = static_cast<ShiftTable*>(malloc(sizeof(ShiftTable)));
   if (!table) return nullptr;
   *table = ShiftTable{.fRefs = 1, .fGroups = nullptr, .fOrder = nullptr, .fCount = 0,
-                      .fGroupCapacity = 0, .fOrderCapacity = 0, .fList = nullptr, .fItems = nullptr, .fItemCount = 0,
-                      .fItemCapacity = 0, .fStale = false};
+                      .fGroupCapacity = 0, .fOrderCapacity = 0, .fList = nullptr,
+                      .fItems = nullptr, .fItemCount = 0, .fItemCapacity = 0, .fStale = false};
   return table;
 }
 
@@ -57,15 +57,8 @@ int ReserveItems(ShiftTable* table, size_t count) {
   return Grow(&table->fItems, &table->fItemCapacity, count, 16);
 }
 
-void RecordItems(ShiftTable* table, const void* list, const void* const* items, size_t count) {
-  table->fList = list;
-  if (count) memcpy(table->fItems, items, count * sizeof(*items));
-  table->fItemCount = count;
-  table->fStale = false;
-}
-
-void RecordReplacedItems(ShiftTable* table, const void* list, size_t index, size_t removed,
-                         const void* const* items, size_t added) {
+void RecordItems(ShiftTable* table, const void* list, size_t index, size_t removed,
+                 const void* const* items, size_t added) {
   table->fList = list;
   const void** at = table->fItems + index;
   const size_t after = table->fItemCount - index - removed;

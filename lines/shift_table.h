@@ -58,14 +58,11 @@ void ShiftGroupsFrom(ShiftTable* table, size_t position, int64_t lines, int64_t 
 // memory is short (no exception set).
 int ReserveItems(ShiftTable* table, size_t count);
 
-// Records the list the table numbers and its items, as they stand now, and trusts them again.
-// Room must have been reserved.
-void RecordItems(ShiftTable* table, const void* list, const void* const* items, size_t count);
-
-// Records that the list's items from `index` on, `removed` of them, were replaced by the
-// `added` items at `items`, and trusts the record again. Room must have been reserved.
-void RecordReplacedItems(ShiftTable* table, const void* list, size_t index, size_t removed,
-                         const void* const* items, size_t added);
+// Records that the items of `list` from `index` on, `removed` of those recorded, are now the
+// `added` items at `items`, and trusts the record again: the whole list when index is 0 and
+// removed all. Room must have been reserved.
+void RecordItems(ShiftTable* table, const void* list, size_t index, size_t removed,
+                 const void* const* items, size_t added);
 
 // True when the list and its items are those recorded and no line has left the numbering since.
 bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,

@@ -78,8 +78,6 @@ uintptr_t EntrySetOf(PyObject* token, uint32_t position) {
   return static_cast<uintptr_t>(mixed >> 40) & (kEntrySets - 1);
 }
 
-bool AnySlot(const ObjectSlot&) { return true; }
-
 // Returns a new pair of the objects that make(0) and make(1) return (new references), out of
 // the collector's sight, or nullptr with an exception set.
 template <typename Make>
@@ -99,8 +97,7 @@ PyObject* NewPair(Make make) {
 PyObject* PositionInt(int32_t value) {
   if (value >= kSharedInts) return PyLong_FromLong(value);
   const auto index = static_cast<size_t>(value);
-  if (const ObjectSlot* known = gPositionInts.Find(index, AnySlot))
-    return Py_NewRef(known->fObject);
+  if (const ObjectSlot* known = gPositionInts.At(index)) return Py_NewRef(known->fObject);
   PyObject* made = PyLong_FromLong(value);
   if (made) gPositionInts.Store(index, ObjectSlot{.fObject = Py_NewRef(made)});
   return made;
@@ -133,7 +130,9 @@ PyObject* ShownText(PyObject* token) {
 
 // Returns a new reference to the entry of a token at a position, made anew.
 PyObject* NewEntry(PyObject* token, TokenPosition at) {
-  return NewPair([token, at](Py_ssize_t i) { return i == 0 ? ShownText(token) : PositionTuple(at); });
+  return NewPair([token, at](Py_ssize_t i) {
+    return i == 0 ? ShownText(token) : PositionTuple(at);
+  });
 }
 
 // Returns a new reference to the entry of a token at a position: the shared one when a shared
@@ -175,7 +174,7 @@ PyObject* BuildTokensTuple(LogicalLine* line) {
 PyObject* PositionTuple(TokenPosition position) {
   if (!IsSharedPosition(position)) return NewPosition(position);
   const auto index = static_cast<size_t>(position.fLine * kSharedColumns + position.fColumn);
-  if (const ObjectSlot* known = gPositions.Find(index, AnySlot)) return Py_NewRef(known->fObject);
+  if (const ObjectSlot* known = gPositions.At(index)) return Py_NewRef(known->fObject);
   PyObject* made = NewPosition(position);
   if (made) gPositions.Store(index, ObjectSlot{.fObject = Py_NewRef(made)});
   return made;

@@ -38,10 +38,11 @@ long MinorVersion(PyObject* version) {
   }
   int overflow = 0;
   const long major = PyLong_AsLongAndOverflow(PyTuple_GET_ITEM(version, 0), &overflow);
-  const long minor = overflow ? -1 : PyLong_AsLongAndOverflow(PyTuple_GET_ITEM(version, 1), &overflow);
+  const long minor =
+      overflow ? -1 : PyLong_AsLongAndOverflow(PyTuple_GET_ITEM(version, 1), &overflow);
   if (major != 3 || minor < 0 || overflow) {
-    PyErr_Format(PyExc_ValueError, "feature_version must be (3, minor) with a minor of 0 or more, not %R",
-                 version);
+    PyErr_Format(PyExc_ValueError,
+                 "feature_version must be (3, minor) with a minor of 0 or more, not %R", version);
     return -1;
   }
   return minor;
