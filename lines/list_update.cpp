@@ -94,17 +94,16 @@ int RefuseChangedList() {
 ShiftTable* Regroup(PyObject* lines) {
   const auto size = static_cast<size_t>(PyList_GET_SIZE(lines));
   ShiftTable* table = NewShiftTable();
-  if (!table || ReserveGroups(table, size / kGroupLines + 1) != 0) {
+  // Every allocation first: a failure then leaves the lines in the numbering they share.
+  if (!table || ReserveGroups(table, size / kGroupLines + 1) != 0 ||
+      ReserveItems(table, size) != 0) {
     if (table) DropShiftTable(table);
     PyErr_NoMemory();
     return nullptr;
   }
   for (size_t i = 0; i < size; i++)
     NumberLine(table, AsLine(PyList_GET_ITEM(lines, i)), i);  // cannot fail: room is reserved
-  if (SealNumbering(table, lines) != 0) {
-    DropShiftTable(table);
-    return nullptr;
-  }
+  SealNumbering(table, lines);  // cannot fail either
   return table;
 }
 
