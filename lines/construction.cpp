@@ -82,8 +82,8 @@ uint8_t FlagIf(int condition, LineFlag flag) { return condition ? flag : 0; }
 
 }  // namespace
 
-PyObject* CreateNativeLogicalLine(const LineParts& parts, bool take) {
-  LogicalLine* line = PartsAreValid(parts) ? NewLogicalLine(StorageBytes(parts)) : nullptr;
+PyObject* CreateNativeLogicalLine(PyTypeObject* lineType, const LineParts& parts, bool take) {
+  LogicalLine* line = PartsAreValid(parts) ? NewLogicalLine(lineType, StorageBytes(parts)) : nullptr;
   if (!line) {
     if (take) ReleaseTokens(parts);
     return nullptr;
@@ -105,8 +105,8 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts, bool take) {
   return owner.Release();
 }
 
-PyObject* CreateLogicalLine(const LineParts& parts, bool take) {
-  if (!gCreateHook) return CreateNativeLogicalLine(parts, take);
+PyObject* CreateLogicalLine(LineState* shared, const LineParts& parts, bool take) {
+  if (!gCreateHook) return CreateNativeLogicalLine(shared->fLineType, parts, take);
   PyObject* made = nullptr;
   if (PartsAreValid(parts)) {
     PyRef hook = PyRef::FromBorrowed(gCreateHook);  // the hook may replace itself while running

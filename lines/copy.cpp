@@ -25,7 +25,7 @@ PyObject* CopyLogicalLine(LogicalLine* source) {
                            .fLineText = text,
                            .fLineTextLength = text ? strlen(text) : 0,
                            .fOffset = SourceOffsetOf(source)};
-  PyRef copy = PyRef::Steal(CreateNativeLogicalLine(parts));
+  PyRef copy = PyRef::Steal(CreateNativeLogicalLine(Py_TYPE(source), parts));
   if (!copy) return nullptr;
   LogicalLine* line = AsLine(copy.Get());
   Py_XINCREF(source->fScopeName);

@@ -17,19 +17,20 @@ namespace {
 
 // Reads logical lines into `list` until the stop line (-1: none), numbering them with `table`
 // when there is one. Returns 0, or -1.
-int ReadLines(ReadingState* state, int64_t stop, PyObject* list, ShiftTable* table) {
+int ReadLines(LineState* shared, ReadingState* state, int64_t stop, PyObject* list,
+              ShiftTable* table) {
   while (!(stop != -1 && state->fLineNumber >= stop) && !state->fSource.fAtEnd) {
     LineParts parts;
     const int built = BuildLogicalLine(state, &parts);
     if (built < 0) return -1;
     if (built == 0) continue;
-    PyRef line = PyRef::Steal(CreateLogicalLine(parts, true));
+    PyRef line = PyRef::Steal(CreateLogicalLine(shared, parts, true));
     GiveUpTokens(state);  // taken over by the call, whatever its outcome
     if (!line) return -1;
     if (line.Get() == Py_None) continue;
     // A readline may install a create hook halfway through: its objects are not numbered, and
     // an update refuses the list from then on, as it refuses every list while a hook is set.
-    if (table && Py_TYPE(line.Get()) == &LogicalLineType &&
+    if (table && IsLogicalLine(line.Get()) &&
         NumberLine(table, AsLine(line.Get()), static_cast<size_t>(PyList_GET_SIZE(list))) != 0)
       return -1;
     if (PyList_Append(list, line.Get()) != 0) return -1;
@@ -39,7 +40,7 @@ int ReadLines(ReadingState* state, int64_t stop, PyObject* list, ShiftTable* tab
 
 }  // namespace
 
-PyObject* ReadLineList(const ReadOptions& options, const LineSource& source) {
+PyObject* ReadLineList(LineState* shared, const ReadOptions& options, const LineSource& source) {
   PyRef list = PyRef::Steal(PyList_New(0));
   if (!list) return nullptr;
   const bool whole = source.fLineCount == -1;
@@ -62,7 +63,7 @@ PyObject* ReadLineList(const ReadOptions& options, const LineSource& source) {
       return PyErr_NoMemory();
     }
   }
-  int status = ReadLines(&state, stop, list.Get(), table);
+  int status = ReadLines(shared, &state, stop, list.Get(), table);
   ReleaseReadingState(&state);
   if (table) {
     if (status == 0) status = SealNumbering(table, list.Get());

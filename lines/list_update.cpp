@@ -114,10 +114,8 @@ ShiftTable* Regroup(PyObject* lines) {
 // prove that its lines still fit it. Returns nullptr with an exception set.
 ShiftTable* TableFor(PyObject* lines) {
   const Py_ssize_t size = PyList_GET_SIZE(lines);
-  const PyObject* first = PyList_GET_ITEM(lines, 0);
-  ShiftTable* table =
-      Py_TYPE(first) == &LogicalLineType ? AsLine(const_cast<PyObject*>(first))->fShiftTable
-                                         : nullptr;
+  PyObject* first = PyList_GET_ITEM(lines, 0);
+  ShiftTable* table = IsLogicalLine(first) ? AsLine(first)->fShiftTable : nullptr;
   if (!table || !ListIsAsNumbered(table, lines)) {
     RefuseChangedList();
     return nullptr;
@@ -160,9 +158,9 @@ int64_t ReReadStart(PyObject* lines, const Edit& edit) {
 // Reads the new text from physical line `start` until the reader starts afresh after the edit
 // at a place where the old read also did, or the text ends. Appends the lines read to `added`
 // and stores the new number of the line where reading stopped. Returns 0, or -1.
-int ReRead(const ReadOptions& options, PyObject* lines, const Edit& edit, const char* data,
-           const char* from, const char* dataEnd, int64_t start, PyObject* added, int64_t* stop,
-           int64_t* stopOffset) {
+int ReRead(const LineState* shared, const ReadOptions& options, PyObject* lines, const Edit& edit,
+           const char* data, const char* from, const char* dataEnd, int64_t start,
+           PyObject* added, int64_t* stop, int64_t* stopOffset) {
   ReadingState state;
   InitBufferReading(&state, options, data, from, dataEnd, start, false);
   int status = 0;
@@ -177,7 +175,7 @@ int ReRead(const ReadOptions& options, PyObject* lines, const Edit& edit, const 
       status = built;
       continue;
     }
-    PyRef line = PyRef::Steal(CreateNativeLogicalLine(parts, true));
+    PyRef line = PyRef::Steal(CreateNativeLogicalLine(shared->fLineType, parts, true));
     GiveUpTokens(&state);  // taken over by the call, whatever its outcome
     if (!line || PyList_Append(added, line.Get()) != 0) status = -1;
   }
@@ -248,8 +246,8 @@ size_t ReservedGroups(Py_ssize_t added) {
 
 // Updates `lines`, numbered by `table`, for the edit, from the new text [data, end). Returns
 // the result, or nullptr with an exception set and `lines` unchanged.
-PyObject* UpdateNumbered(const ReadOptions& options, PyObject* lines, ShiftTable* table,
-                         const Edit& edit, const char* data, const char* end) {
+PyObject* UpdateNumbered(const LineState* shared, const ReadOptions& options, PyObject* lines,
+                         ShiftTable* table, const Edit& edit, const char* data, const char* end) {
   const int64_t start = ReReadStart(lines, edit);
   bool whole = true;
   const char* from = PhysicalLineStart(lines, data, end, start, &whole);
@@ -263,7 +261,7 @@ PyObject* UpdateNumbered(const ReadOptions& options, PyObject* lines, ShiftTable
   PyRef added = PyRef::Steal(PyList_New(0));
   int64_t stop = 0;
   int64_t stopOffset = 0;
-  if (!added || ReRead(options, lines, edit, data, from, end, start, added.Get(), &stop,
+  if (!added || ReRead(shared, options, lines, edit, data, from, end, start, added.Get(), &stop,
                       &stopOffset) != 0)
     return nullptr;
   // Old lines from the start up to where the re-read stopped, in the old numbering, go. The
@@ -301,12 +299,12 @@ PyObject* UpdateNumbered(const ReadOptions& options, PyObject* lines, ShiftTable
 
 }  // namespace
 
-PyObject* UpdateLineList(const ReadOptions& options, PyObject* lines, const Edit& edit,
-                         const char* data, const char* end) {
+PyObject* UpdateLineList(const LineState* shared, const ReadOptions& options, PyObject* lines,
+                         const Edit& edit, const char* data, const char* end) {
   if (PyList_GET_SIZE(lines) > 0) {
     ShiftTable* table = TableFor(lines);
     if (!table) return nullptr;
-    PyObject* result = UpdateNumbered(options, lines, table, edit, data, end);
+    PyObject* result = UpdateNumbered(shared, options, lines, table, edit, data, end);
     DropShiftTable(table);
     return result;
   }
@@ -321,7 +319,7 @@ PyObject* UpdateLineList(const ReadOptions& options, PyObject* lines, const Edit
   ShiftTable* table = NewShiftTable();
   if (!table) return PyErr_NoMemory();
   const Edit whole{.fFirst = 0, .fOldCount = 0, .fNewCount = total};
-  PyObject* result = UpdateNumbered(options, lines, table, whole, data, end);
+  PyObject* result = UpdateNumbered(shared, options, lines, table, whole, data, end);
   DropShiftTable(table);
   return result;
 }

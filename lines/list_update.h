@@ -8,6 +8,7 @@
 #include <cstdint>
 
 #include "assembly/line_parts.h"
+#include "lines/line_state.h"
 
 // The edit, in physical lines, each count >= 0: [fFirst, fFirst + fOldCount) of the old text
 // became [fFirst, fFirst + fNewCount) of the new one.
@@ -19,10 +20,11 @@ struct Edit {
 };
 
 // Makes `lines`, a list that a full read or an earlier update left, what a full read of the new
-// text [data, end) gives. Returns a new (index, removed, added) tuple: from index on, `removed`
-// old lines went and the list `added` took their place. Returns nullptr with an exception set
-// and `lines` exactly as it was: ValueError for an edit outside the text, for lines that do not
-// fit it, or for a list that the host changed since. No host code may run during the call (the
-// caller keeps the collector waiting), and no create hook may be installed.
-PyObject* UpdateLineList(const ReadOptions& options, PyObject* lines, const Edit& edit,
-                         const char* data, const char* end);
+// text [data, end) gives; new lines are made as `shared` makes them. Returns a new (index,
+// removed, added) tuple: from index on, `removed` old lines went and the list `added` took their
+// place. Returns nullptr with an exception set and `lines` exactly as it was: ValueError for an
+// edit outside the text, for lines that do not fit it, or for a list that the host changed
+// since. No host code may run during the call (the caller keeps the collector waiting), and no
+// create hook may be installed.
+PyObject* UpdateLineList(const LineState* shared, const ReadOptions& options, PyObject* lines,
+                         const Edit& edit, const char* data, const char* end);

@@ -7,8 +7,8 @@
 
 #include "core/py_ref.h"
 #include "lines/tokens_tuple.h"
-#include "module/constants.h"
 #include "module/line_surface.h"
+#include "module/module_state.h"
 
 namespace {
 
@@ -42,7 +42,7 @@ PyObject* ObjectOrNone(PyObject* object) {
 // Getters, in attribute table order.
 
 PyObject* GetType(PyObject* self, void*) {
-  PyObject* constant = LineTypeTable[AsLine(self)->fType].fObject;
+  PyObject* constant = StateOfType(Py_TYPE(self))->fLineTypes[AsLine(self)->fType];
   Py_INCREF(constant);
   return constant;
 }

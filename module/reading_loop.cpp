@@ -18,11 +18,12 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
     PyErr_SetString(PyExc_ValueError, "first line must be >= 0");
     return nullptr;
   }
-  return ReadLineList(ParserOptions(self), LineSource{.fReadline = readline,
-                                                      .fData = data,
-                                                      .fDataEnd = dataEnd,
-                                                      .fFirstLine = firstLine,
-                                                      .fLineCount = lineCount});
+  return ReadLineList(ParserShared(self), ParserOptions(self),
+                      LineSource{.fReadline = readline,
+                                 .fData = data,
+                                 .fDataEnd = dataEnd,
+                                 .fFirstLine = firstLine,
+                                 .fLineCount = lineCount});
 }
 
 PyDoc_STRVAR(kGetLogicalLineListDoc,

@@ -50,7 +50,7 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
   const int collecting = PyGC_Disable();
   const char* data = static_cast<const char*>(view.buf);
   PyObject* result =
-      UpdateLineList(ParserOptions(self), lines,
+      UpdateLineList(ParserShared(self), ParserOptions(self), lines,
                      Edit{.fFirst = first, .fOldCount = oldCount, .fNewCount = newCount}, data,
                      data + view.len);
   if (collecting) PyGC_Enable();

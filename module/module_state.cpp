@@ -1,0 +1,72 @@
+// The module's state, and the calling interpreter's module. An interpreter keeps a weak
+// reference to the module it imported last in its own dictionary: native callers then reach
+// that module's state without keeping the module alive.
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
+#include "module/module_state.h"
+
+#include "core/py_ref.h"
+
+namespace {
+
+constexpr char kCurrentModuleKey[] = "logicalline.current_module";
+
+// Returns the calling interpreter's dictionary (borrowed), or nullptr with RuntimeError set.
+PyObject* InterpreterDict() {
+  PyObject* dict = PyInterpreterState_GetDict(PyInterpreterState_Get());
+  if (!dict) PyErr_SetString(PyExc_RuntimeError, "the interpreter keeps no dictionary");
+  return dict;
+}
+
+// Returns a new reference to the object a weak reference names, or None once it is gone.
+PyObject* Referent(PyObject* ref) {
+#if PY_VERSION_HEX >= 0x030D0000
+  PyObject* object = nullptr;
+  if (PyWeakref_GetRef(ref, &object) < 0) return nullptr;
+  return object ? object : Py_NewRef(Py_None);
+#else
+  return Py_NewRef(PyWeakref_GetObject(ref));
+#endif
+}
+
+}  // namespace
+
+int MakeCurrent(PyObject* module) {
+  PyObject* dict = InterpreterDict();
+  if (!dict) return -1;
+  PyRef ref = PyRef::Steal(PyWeakref_NewRef(module, nullptr));
+  if (!ref) return -1;
+  return PyDict_SetItemString(dict, kCurrentModuleKey, ref.Get());
+}
+
+PyObject* CurrentModule() {
+  PyObject* dict = InterpreterDict();
+  if (!dict) return nullptr;
+  PyObject* ref = PyDict_GetItemString(dict, kCurrentModuleKey);  // borrowed
+  PyRef module = PyRef::Steal(ref ? Referent(ref) : Py_NewRef(Py_None));
+  if (!module) return nullptr;
+  if (module.Get() == Py_None) {
+    PyErr_SetString(PyExc_RuntimeError, "logicalline is not imported in this interpreter");
+    return nullptr;
+  }
+  return module.Release();
+}
+
+int VisitState(ModuleState* state, visitproc visit, void* arg) {
+  Py_VISIT(state->fParserType);
+  for (PyObject* constant : state->fLineTypes) Py_VISIT(constant);
+  return state->fShared ? VisitLineState(state->fShared, visit, arg) : 0;
+}
+
+void ClearState(ModuleState* state) {
+  Py_CLEAR(state->fParserType);
+  for (PyObject*& constant : state->fLineTypes) Py_CLEAR(constant);
+  if (state->fShared) ClearLineState(state->fShared);
+}
+
+void FreeState(ModuleState* state) {
+  ClearState(state);
+  if (state->fShared) FreeLineState(state->fShared);
+  state->fShared = nullptr;
+}
