@@ -24,7 +24,7 @@ bool PartsAreValid(const LineParts& parts) {
   return false;
 }
 
-PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
+PyObject* CallCreateHook(LineState* shared, PyObject* hook, const LineParts& parts) {
   PyRef tokens = PyRef::Steal(PyTuple_New(parts.fTokenCount));
   if (!tokens) return nullptr;
   PyRef positions = PyRef::Steal(PyTuple_New(parts.fTokenCount));
@@ -32,7 +32,7 @@ PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
   for (int i = 0; i < parts.fTokenCount; i++) {
     Py_INCREF(parts.fTokens[i]);
     PyTuple_SET_ITEM(tokens.Get(), i, parts.fTokens[i]);
-    PyObject* pair = PositionTuple(parts.fPositions[i]);
+    PyObject* pair = PositionTuple(shared->fEntries, parts.fPositions[i]);
     if (!pair) return nullptr;
     PyTuple_SET_ITEM(positions.Get(), i, pair);
   }
@@ -83,7 +83,8 @@ uint8_t FlagIf(int condition, LineFlag flag) { return condition ? flag : 0; }
 }  // namespace
 
 PyObject* CreateNativeLogicalLine(PyTypeObject* lineType, const LineParts& parts, bool take) {
-  LogicalLine* line = PartsAreValid(parts) ? NewLogicalLine(lineType, StorageBytes(parts)) : nullptr;
+  LogicalLine* line =
+      PartsAreValid(parts) ? NewLogicalLine(lineType, StorageBytes(parts)) : nullptr;
   if (!line) {
     if (take) ReleaseTokens(parts);
     return nullptr;
@@ -110,7 +111,7 @@ PyObject* CreateLogicalLine(LineState* shared, const LineParts& parts, bool take
   PyObject* made = nullptr;
   if (PartsAreValid(parts)) {
     PyRef hook = PyRef::FromBorrowed(gCreateHook);  // the hook may replace itself while running
-    made = CallCreateHook(hook.Get(), parts);
+    made = CallCreateHook(shared, hook.Get(), parts);
   }
   if (take) ReleaseTokens(parts);  // the hook's arguments hold references of their own
   return made;

@@ -6,7 +6,9 @@
 
 #include <cstdlib>
 
+#include "assembly/token_cache.h"
 #include "lines/logical_line.h"
+#include "lines/tokens_tuple.h"
 
 LineState* NewLineState(PyObject* module, PyMethodDef* methods, PyGetSetDef* attributes) {
   auto* shared = static_cast<LineState*>(calloc(1, sizeof(LineState)));
@@ -14,7 +16,9 @@ LineState* NewLineState(PyObject* module, PyMethodDef* methods, PyGetSetDef* att
     PyErr_NoMemory();
     return nullptr;
   }
-  shared->fLineType = NewLineType(module, methods, attributes);
+  shared->fTokenTexts = NewTokenTexts();
+  shared->fEntries = shared->fTokenTexts ? NewEntryTables() : nullptr;
+  shared->fLineType = shared->fEntries ? NewLineType(module, methods, attributes) : nullptr;
   if (!shared->fLineType) {
     FreeLineState(shared);
     return nullptr;
@@ -27,9 +31,19 @@ int VisitLineState(LineState* shared, visitproc visit, void* arg) {
   return 0;
 }
 
-void ClearLineState(LineState* shared) { Py_CLEAR(shared->fLineType); }
+void ClearLineState(LineState* shared) {
+  Py_CLEAR(shared->fLineType);
+  ReleaseSharedTables(shared);
+}
+
+void ReleaseSharedTables(LineState* shared) {
+  if (shared->fEntries) ReleaseEntryTables(shared->fEntries);
+  if (shared->fTokenTexts) ReleaseTokenTexts(shared->fTokenTexts);
+}
 
 void FreeLineState(LineState* shared) {
   ClearLineState(shared);
+  FreeEntryTables(shared->fEntries);
+  FreeTokenTexts(shared->fTokenTexts);
   free(shared);
 }

@@ -6,8 +6,13 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
+struct TokenTexts;   // assembly/token_cache.h
+struct EntryTables;  // lines/tokens_tuple.h
+
 struct LineState {
   PyTypeObject* fLineType;  // owned: this interpreter's LogicalLine type
+  TokenTexts* fTokenTexts;  // owned tables: the token texts that reads share
+  EntryTables* fEntries;    // owned tables: the parts of fTokens that lines share
 };
 
 // Returns a new state, with a LogicalLine type for `module` that has the Python surface's
@@ -19,6 +24,9 @@ int VisitLineState(LineState* shared, visitproc visit, void* arg);
 
 // Releases every object the state holds; what it holds afterwards is empty.
 void ClearLineState(LineState* shared);
+
+// Empties the tables that reads share, keeping the rest.
+void ReleaseSharedTables(LineState* shared);
 
 // Releases the state and its block.
 void FreeLineState(LineState* shared);

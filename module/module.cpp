@@ -90,8 +90,8 @@ PyObject* SetLogicalCreateFunction(PyObject*, PyObject* args) {
 PyDoc_STRVAR(kReleaseSharedTablesDoc,
              "Empty the tables of token texts and fTokens entries that reads share, as when the "
              "module is freed.  For leak checks: what reading holds can then be counted.");
-PyObject* ReleaseSharedTablesFunction(PyObject*, PyObject*) {
-  ReleaseSharedTables();
+PyObject* ReleaseSharedTablesFunction(PyObject* module, PyObject*) {
+  ReleaseSharedTables(StateOf(module)->fShared);
   Py_RETURN_NONE;
 }
 

@@ -116,6 +116,7 @@ PyObject* NewParser(ModuleState* state, PyObject* copyStrings, PyObject* skipWhi
 ReadOptions ParserOptions(PyObject* self) {
   const LogicalLineParser* parser = reinterpret_cast<const LogicalLineParser*>(self);
   return ReadOptions{.fOperatorTable = parser->fOperatorTable,
+                     .fTokenTexts = parser->fShared->fTokenTexts,
                      .fCopyStrings = parser->fCopyStrings != 0,
                      .fSkipWhitespaceLines = parser->fSkipWhitespaceLines != 0,
                      .fRemoveComments = parser->fRemoveComments != 0,

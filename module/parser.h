@@ -18,17 +18,16 @@ struct LogicalLineParser {
   const OperatorTable* fOperatorTable;  // always the module's one table
   int fIncludeLineText;      // lines carry their source text
   StringRules fStringRules;  // the interpreter version whose strings the parser reads
-  LineState* fShared;        // its interpreter's: the module that owns it lives while its
-                             // type, which every parser holds, does
+  LineState* fShared;        // its module's, which lives while the parser holds its type
 };
 
 // Returns a new parser type for `module`, or nullptr with an exception set.
 PyTypeObject* NewParserType(PyObject* module);
 
-// Returns a new parser of the module whose state is `state`, whose options are the truth values of the four objects, taken in the
-// order skip_whitespace_lines, remove_comments, copy_strings, include_line_text, and the
-// string rules of featureVersion; nullptr with the exception of the first truth test that
-// raises, or of a feature version that is refused.
+// Returns a new parser of the module whose state is `state`, whose options are the truth values
+// of the four objects, taken in the order skip_whitespace_lines, remove_comments, copy_strings,
+// include_line_text, and the string rules of featureVersion; nullptr with the exception of the
+// first truth test that raises, or of a feature version that is refused.
 PyObject* NewParser(ModuleState* state, PyObject* copyStrings, PyObject* skipWhitespaceLines,
                     PyObject* removeComments, PyObject* includeLineText, PyObject* featureVersion);
 
