@@ -16,8 +16,6 @@
 
 namespace {
 
-PyObject* gCreateHook = nullptr;  // owned; null until SetLogicalCreateFunction
-
 bool PartsAreValid(const LineParts& parts) {
   if (parts.fIndentLevel >= 0 && parts.fFirstLine >= 0 && parts.fLineCount >= 1) return true;
   RaiseBadInternalCall(kConstructionCheckLine);
@@ -107,22 +105,23 @@ PyObject* CreateNativeLogicalLine(PyTypeObject* lineType, const LineParts& parts
 }
 
 PyObject* CreateLogicalLine(LineState* shared, const LineParts& parts, bool take) {
-  if (!gCreateHook) return CreateNativeLogicalLine(shared->fLineType, parts, take);
+  if (!shared->fCreateHook) return CreateNativeLogicalLine(shared->fLineType, parts, take);
   PyObject* made = nullptr;
   if (PartsAreValid(parts)) {
-    PyRef hook = PyRef::FromBorrowed(gCreateHook);  // the hook may replace itself while running
+    // The hook may replace itself while running.
+    PyRef hook = PyRef::FromBorrowed(shared->fCreateHook);
     made = CallCreateHook(shared, hook.Get(), parts);
   }
   if (take) ReleaseTokens(parts);  // the hook's arguments hold references of their own
   return made;
 }
 
-bool HasCreateHook() { return gCreateHook != nullptr; }
+bool HasCreateHook(const LineState* shared) { return shared->fCreateHook != nullptr; }
 
-void SetCreateHook(PyObject* hook) {
+void SetCreateHook(LineState* shared, PyObject* hook) {
   // Install before releasing the old hook: its release may run code that installs another.
   Py_INCREF(hook);
-  PyObject* old = gCreateHook;
-  gCreateHook = hook;
+  PyObject* old = shared->fCreateHook;
+  shared->fCreateHook = hook;
   Py_XDECREF(old);
 }

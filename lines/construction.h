@@ -1,5 +1,5 @@
-// Construction of LogicalLine objects from the parts of a logical line, and the process-wide
-// create hook that may take construction over.
+// Construction of LogicalLine objects from the parts of a logical line, and the create hook of
+// an interpreter, which may take construction over there.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN
@@ -19,8 +19,9 @@ PyObject* CreateLogicalLine(LineState* shared, const LineParts& parts, bool take
 PyObject* CreateNativeLogicalLine(PyTypeObject* lineType, const LineParts& parts,
                                   bool take = false);
 
-// True once a create hook is installed: lines are then the host's own objects.
-bool HasCreateHook();
+// True once a create hook is installed in `shared`: lines are then the host's own objects.
+bool HasCreateHook(const LineState* shared);
 
-// Installs the create hook (any object; a new reference is kept), releasing the previous one.
-void SetCreateHook(PyObject* hook);
+// Installs the create hook of `shared` (any object; a new reference is kept), releasing the
+// previous one.
+void SetCreateHook(LineState* shared, PyObject* hook);

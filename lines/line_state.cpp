@@ -28,11 +28,13 @@ LineState* NewLineState(PyObject* module, PyMethodDef* methods, PyGetSetDef* att
 
 int VisitLineState(LineState* shared, visitproc visit, void* arg) {
   Py_VISIT(shared->fLineType);
+  Py_VISIT(shared->fCreateHook);  // may well hold the module, through a host's globals
   return 0;
 }
 
 void ClearLineState(LineState* shared) {
   Py_CLEAR(shared->fLineType);
+  Py_CLEAR(shared->fCreateHook);
   ReleaseSharedTables(shared);
 }
 

@@ -11,6 +11,7 @@ struct EntryTables;  // lines/tokens_tuple.h
 
 struct LineState {
   PyTypeObject* fLineType;  // owned: this interpreter's LogicalLine type
+  PyObject* fCreateHook;    // owned, or null until SetLogicalCreateFunction
   TokenTexts* fTokenTexts;  // owned tables: the token texts that reads share
   EntryTables* fEntries;    // owned tables: the parts of fTokens that lines share
 };

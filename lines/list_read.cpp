@@ -56,7 +56,7 @@ PyObject* ReadLineList(LineState* shared, const ReadOptions& options, const Line
   // A whole read is numbered as it is built, so that the first update of the list need not
   // walk it; a window cannot be updated, and a hook's lines are not ours.
   ShiftTable* table = nullptr;
-  if (source.fFirstLine == 0 && whole && !HasCreateHook()) {
+  if (source.fFirstLine == 0 && whole && !HasCreateHook(shared)) {
     table = NewShiftTable();
     if (!table) {
       ReleaseReadingState(&state);

@@ -80,10 +80,10 @@ PyObject* GetFirstCodeUnit(PyObject*, PyObject* args) {
   return PyUnicode_FromKindAndData(PyUnicode_4BYTE_KIND, &unit, 1);
 }
 
-PyObject* SetLogicalCreateFunction(PyObject*, PyObject* args) {
+PyObject* SetLogicalCreateFunction(PyObject* module, PyObject* args) {
   PyObject* hook = nullptr;
   if (!PyArg_ParseTuple(args, "O", &hook)) return nullptr;
-  SetCreateHook(hook);
+  SetCreateHook(StateOf(module)->fShared, hook);
   Py_RETURN_NONE;
 }
 
@@ -136,8 +136,14 @@ int ClearModule(PyObject* module) {
 
 void FreeModule(void* module) { FreeState(StateOf(static_cast<PyObject*>(module))); }
 
+// Every interpreter may import the module, even one with a lock of its own: all that an import
+// makes is its own. No Py_mod_gil slot: a build without the lock takes it back on import, since
+// the state has not been shown safe without it.
 PyModuleDef_Slot kModuleSlots[] = {
     {Py_mod_exec, reinterpret_cast<void*>(ExecModule)},
+#ifdef Py_mod_multiple_interpreters
+    {Py_mod_multiple_interpreters, Py_MOD_PER_INTERPRETER_GIL_SUPPORTED},
+#endif
     {0, nullptr},
 };
 

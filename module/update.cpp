@@ -35,7 +35,7 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
     Py_buffer* fView;
     ~Release() { PyBuffer_Release(fView); }
   } release{&view};
-  if (HasCreateHook()) {
+  if (HasCreateHook(ParserShared(self))) {
     PyErr_SetString(PyExc_TypeError,
                     "UpdateLogicalLineList needs the module's own lines, and a create hook is "
                     "installed");
