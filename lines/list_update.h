@@ -24,7 +24,7 @@ struct Edit {
 // removed, added) tuple: from index on, `removed` old lines went and the list `added` took their
 // place. Returns nullptr with an exception set and `lines` exactly as it was: ValueError for an
 // edit outside the text, for lines that do not fit it, or for a list that the host changed
-// since. No host code may run during the call (the caller keeps the collector waiting), and no
-// create hook may be installed.
+// since. No host code may run during the call (where an allocation can start a collection, the
+// caller holds the collector off), and no create hook may be installed.
 PyObject* UpdateLineList(const LineState* shared, const ReadOptions& options, PyObject* lines,
                          const Edit& edit, const char* data, const char* end);
