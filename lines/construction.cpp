@@ -125,3 +125,5 @@ void SetCreateHook(LineState* shared, PyObject* hook) {
   shared->fCreateHook = hook;
   Py_XDECREF(old);
 }
+
+void DropCreateHook(LineState* shared) { Py_CLEAR(shared->fCreateHook); }

@@ -25,3 +25,6 @@ bool HasCreateHook(const LineState* shared);
 // Installs the create hook of `shared` (any object; a new reference is kept), releasing the
 // previous one.
 void SetCreateHook(LineState* shared, PyObject* hook);
+
+// Removes the create hook of `shared`, if one is installed: lines are the module's own again.
+void DropCreateHook(LineState* shared);

@@ -7,6 +7,7 @@
 #include <cstdlib>
 
 #include "assembly/token_cache.h"
+#include "lines/construction.h"
 #include "lines/logical_line.h"
 #include "lines/tokens_tuple.h"
 
@@ -34,7 +35,7 @@ int VisitLineState(LineState* shared, visitproc visit, void* arg) {
 
 void ClearLineState(LineState* shared) {
   Py_CLEAR(shared->fLineType);
-  Py_CLEAR(shared->fCreateHook);
+  DropCreateHook(shared);
   ReleaseSharedTables(shared);
 }
 

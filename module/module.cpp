@@ -115,7 +115,7 @@ int FillModule(PyObject* module) {
   if (!state->fShared) return -1;
   state->fParserType = NewParserType(module);
   if (!state->fParserType || AddModuleConstants(module, state) != 0) return -1;
-  return MakeCurrent(module);
+  return MakeCurrent(module) == 0 && DropCreateHookAtExit(module) == 0 ? 0 : -1;
 }
 
 // A failure ends the process: there is no partly initialised module.

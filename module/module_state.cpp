@@ -1,4 +1,4 @@
-// The module's state, and the calling interpreter's module. An interpreter keeps a weak
+// The module's state, and what the module's interpreter does for it. An interpreter keeps a weak
 // reference to the module it imported last in its own dictionary: native callers then reach
 // that module's state without keeping the module alive.
 #define PY_SSIZE_T_CLEAN
@@ -7,6 +7,7 @@
 #include "module/module_state.h"
 
 #include "core/py_ref.h"
+#include "lines/construction.h"
 
 namespace {
 
@@ -30,7 +31,33 @@ PyObject* Referent(PyObject* ref) {
 #endif
 }
 
+// Drops the create hook of the module that `ref`, a weak reference, names, if it still lives.
+//
+// A hook is host code, which reaches the host's globals, where the host keeps its lines and
+// parsers. Those hold the module's types, and the types hold the module; but the collector does
+// not watch a parser, nor a line that the host never annotated, and so cannot tell that the
+// module, its hook and the lines form a cycle and nothing else. Dropped when the interpreter
+// shuts down, the hook lets the module go, with everything it holds.
+PyObject* DropHookOf(PyObject* ref, PyObject*) {
+  PyRef module = PyRef::Steal(Referent(ref));
+  if (!module) return nullptr;
+  if (module.Get() != Py_None) DropCreateHook(StateOf(module.Get())->fShared);
+  Py_RETURN_NONE;
+}
+
+PyMethodDef kDropHookMethod = {"_DropCreateHook", DropHookOf, METH_NOARGS, nullptr};
+
 }  // namespace
+
+int DropCreateHookAtExit(PyObject* module) {
+  PyRef ref = PyRef::Steal(PyWeakref_NewRef(module, nullptr));
+  if (!ref) return -1;
+  PyRef drop = PyRef::Steal(PyCFunction_New(&kDropHookMethod, ref.Get()));
+  if (!drop) return -1;
+  PyRef atexit = PyRef::Steal(PyImport_ImportModule("atexit"));
+  if (!atexit) return -1;
+  return PyRef::Steal(PyObject_CallMethod(atexit.Get(), "register", "O", drop.Get())) ? 0 : -1;
+}
 
 int MakeCurrent(PyObject* module) {
   PyObject* dict = InterpreterDict();

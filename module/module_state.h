@@ -32,6 +32,10 @@ int MakeCurrent(PyObject* module);
 // callers, which name no module; nullptr with RuntimeError set when there is none.
 PyObject* CurrentModule();
 
+// Has the interpreter drop the module's create hook when it shuts down, among its exit
+// functions. Returns 0, or -1 with an exception set.
+int DropCreateHookAtExit(PyObject* module);
+
 // Visits, releases and frees what a state holds, for the module's slots.
 int VisitState(ModuleState* state, visitproc visit, void* arg);
 void ClearState(ModuleState* state);
