@@ -30,8 +30,10 @@ mirror() {
 
 make_root() {
   if [[ -f "$STAMP" && "$(cat "$STAMP")" == "${PACKAGES[*]}" ]]; then return 0; fi
-  command -v mmdebstrap >/dev/null 2>&1 ||
-    apt-get install -y -q mmdebstrap >/dev/null
+  if ! command -v mmdebstrap >/dev/null 2>&1; then
+    apt-get install -y -q mmdebstrap >/dev/null 2>&1 ||
+      { apt-get update -q >/dev/null && apt-get install -y -q mmdebstrap >/dev/null; }
+  fi
   rm -rf "$ROOT.new"
   mkdir -p "$(dirname "$ROOT")"
   local packages
