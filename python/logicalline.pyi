@@ -48,6 +48,8 @@ kGenericAttribInfo: Final[tuple[str, None]]
 
 LogicalLineType: Final[type[LogicalLine]]
 COMMENT_TOKEN: Final[int]
+# The release, as the package metadata gives it: "0.2.0".
+__version__: Final[str]
 
 @final
 @type_check_only
