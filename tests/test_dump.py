@@ -1,3 +1,4 @@
+import glob
 import importlib.metadata
 import io
 import json
@@ -257,3 +258,26 @@ def test_decoding_reads_on_where_the_interpreter_stops(data):
         compile(data, "x.py", "exec")
     line = logicalline.CreateLogicalLineParser().GetLogicalLineListFromBuffer(source_to_utf8(data))
     assert "\ufffd" in line[-1].fTokens[2][0]
+
+
+@pytest.mark.skipif(sys.version_info < (3, 12), reason="3.10 and 3.11 read as by default")
+def test_reading_as_this_interpreter_is_reading_as_the_newest_version():
+    # What the README tells a tool author to check their results against the dump tool with.
+    running = logicalline.CreateLogicalLineParser(feature_version=sys.version_info[:2])
+    newest = logicalline.CreateLogicalLineParser(
+        feature_version=logicalline.kNewestFeatureVersion)
+    files = sorted(glob.glob(os.path.join(os.path.dirname(os.__file__), "**", "*.py"),
+                             recursive=True))
+    compiled = 0
+    for path in (path for path in files[::25] if "-packages" not in path):
+        data = pathlib.Path(path).read_bytes()
+        try:
+            compile(data, path, "exec")
+        except (SyntaxError, ValueError):
+            continue  # this interpreter refuses it, so it may read either way
+        compiled += 1
+        assert [(x.fType, x.fIncomplete, x.fLineCount, x.fTokens)
+                for x in running.GetLogicalLineListFromBuffer(data)] == [
+            (x.fType, x.fIncomplete, x.fLineCount, x.fTokens)
+            for x in newest.GetLogicalLineListFromBuffer(data)], path
+    assert compiled > 40
