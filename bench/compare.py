@@ -203,7 +203,7 @@ def run_comparison(corpus, runs, slow_runs):
 # ---------------------------------------------------------------------------------------------
 # --dump
 
-# Bounds that --help of the dump tool states: its peak memory growth per byte of the biggest
+# Bounds that the README states for the dump tool: its peak memory growth per byte of the biggest
 # input file, on one dense line and on an ordinary tree.
 DUMP_DENSE_BYTES_PER_BYTE = 130
 DUMP_TREE_BYTES_PER_BYTE = 20

@@ -21,8 +21,9 @@ PYTHON=$(command -v python3.11-dbg)
 # the reference total) on for the module as it is for the interpreter.
 PYCONFIG=$("$PYTHON" -c 'import sysconfig; print(sysconfig.get_config_h_filename())')
 mkdir -p "$BUILD"
-cmake -S "$ROOT" -B "$BUILD" -DCMAKE_BUILD_TYPE=Debug -DPython_EXECUTABLE="$PYTHON" \
-      "-DCMAKE_CXX_FLAGS=-include $PYCONFIG" > "$BUILD/configure.log" 2>&1 ||
+cmake -S "$ROOT" -B "$BUILD" -DCMAKE_BUILD_TYPE=Debug -DLOGICALLINE_WERROR=ON \
+      -DPython_EXECUTABLE="$PYTHON" "-DCMAKE_CXX_FLAGS=-include $PYCONFIG" \
+      > "$BUILD/configure.log" 2>&1 ||
   { cat "$BUILD/configure.log"; exit 1; }
 cmake --build "$BUILD" -j 2 > "$BUILD/build.log" 2>&1 || { cat "$BUILD/build.log"; exit 1; }
 

@@ -32,8 +32,9 @@ RT=$(clang++-14 -print-runtime-dir 2>/dev/null || true)
 if [[ -n "$RT" && -f "$RT/libclang_rt.fuzzer_no_main-x86_64.a" ]]; then
   BUILD="$OUT/module"
   rm -rf "$BUILD"  # configured afresh: a stale cache may name another interpreter
-  cmake -S "$ROOT" -B "$BUILD" -DLOGICALLINE_SANITIZE=ON -DCMAKE_CXX_COMPILER=clang++-14 \
-        -DCMAKE_CXX_FLAGS=-fsanitize=fuzzer-no-link -DPython_EXECUTABLE="$PYTHON" \
+  cmake -S "$ROOT" -B "$BUILD" -DLOGICALLINE_SANITIZE=ON -DLOGICALLINE_WERROR=ON \
+        -DCMAKE_CXX_COMPILER=clang++-14 -DCMAKE_CXX_FLAGS=-fsanitize=fuzzer-no-link \
+        -DPython_EXECUTABLE="$PYTHON" \
         > "$OUT/configure.log" 2>&1 || { cat "$OUT/configure.log"; exit 1; }
   cmake --build "$BUILD" -j 2 > "$OUT/build.log" 2>&1 || { cat "$OUT/build.log"; exit 1; }
   # One preloaded runtime with both ASan and libFuzzer, so that the module's coverage counters
@@ -49,8 +50,8 @@ else
   echo "clang-14 not available: fuzzing the gcc sanitizer build without native coverage"
   BUILD="$ROOT/build-asan"
   rm -rf "$BUILD"
-  cmake -S "$ROOT" -B "$BUILD" -DLOGICALLINE_SANITIZE=ON -DCMAKE_CXX_COMPILER=g++ \
-        -DPython_EXECUTABLE="$PYTHON" > "$OUT/configure.log" 2>&1 &&
+  cmake -S "$ROOT" -B "$BUILD" -DLOGICALLINE_SANITIZE=ON -DLOGICALLINE_WERROR=ON \
+        -DCMAKE_CXX_COMPILER=g++ -DPython_EXECUTABLE="$PYTHON" > "$OUT/configure.log" 2>&1 &&
     cmake --build "$BUILD" -j 2 > "$OUT/build.log" 2>&1 || { cat "$OUT/build.log"; exit 1; }
   RUNTIME=$(g++ -print-file-name=libasan.so)
 fi

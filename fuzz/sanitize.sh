@@ -21,8 +21,8 @@ fi
 # the sanitizers would otherwise win.
 rm -rf "$BUILD"
 mkdir -p "$BUILD"
-cmake -S "$ROOT" -B "$BUILD" -DLOGICALLINE_SANITIZE=ON -DCMAKE_CXX_COMPILER=g++ \
-      -DPython_EXECUTABLE="$PYTHON" > "$BUILD/configure.log" 2>&1 ||
+cmake -S "$ROOT" -B "$BUILD" -DLOGICALLINE_SANITIZE=ON -DLOGICALLINE_WERROR=ON \
+      -DCMAKE_CXX_COMPILER=g++ -DPython_EXECUTABLE="$PYTHON" > "$BUILD/configure.log" 2>&1 ||
   { cat "$BUILD/configure.log"; exit 1; }
 cmake --build "$BUILD" -j 2 > "$BUILD/build.log" 2>&1 || { cat "$BUILD/build.log"; exit 1; }
 

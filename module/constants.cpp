@@ -1,4 +1,4 @@
-// The line type constants and the other constants that the module publishes.
+// The line type constants, the other constants that the module publishes, and its version.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
@@ -90,6 +90,9 @@ int AddModuleConstants(PyObject* module, ModuleState* state) {
   PyObject* lineType = reinterpret_cast<PyObject*>(state->fShared->fLineType);
   if (PyDict_SetItemString(dict, "LogicalLineType", lineType) != 0) return -1;
   PyRef comment = PyRef::Steal(PyLong_FromLong(COMMENT_TOKEN));
-  if (!comment) return -1;
-  return PyDict_SetItemString(dict, "COMMENT_TOKEN", comment.Get());
+  if (!comment || PyDict_SetItemString(dict, "COMMENT_TOKEN", comment.Get()) != 0) return -1;
+  // The build compiles in the version that the package metadata also carries.
+  PyRef version = PyRef::Steal(PyUnicode_FromString(LOGICALLINE_VERSION));
+  if (!version) return -1;
+  return PyDict_SetItemString(dict, "__version__", version.Get());
 }

@@ -1,5 +1,5 @@
 // The constants that the module publishes: the line types as bytes objects, the attribute
-// kinds and infos, LogicalLineType and COMMENT_TOKEN.
+// kinds and infos, LogicalLineType, COMMENT_TOKEN and __version__.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN

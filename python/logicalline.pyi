@@ -1,8 +1,10 @@
 # Type stub of the logicalline extension module.
 #
 # LogicalLine, LogicalLineParser and CreateHook exist for type checking only: the module does
-# not publish the two types under these names (LogicalLineType is the line type object), so
-# annotate with them under `if TYPE_CHECKING:` or in string annotations.
+# not publish the two types under these names, so `from logicalline import LogicalLine` fails
+# at run time. Import them under `if TYPE_CHECKING:` and annotate with them there or in string
+# annotations. At run time the line type is LogicalLineType, and a parser comes only from
+# CreateLogicalLineParser.
 
 from collections.abc import Callable
 from typing import Final, Protocol, final, type_check_only
@@ -48,6 +50,8 @@ kGenericAttribInfo: Final[tuple[str, None]]
 
 LogicalLineType: Final[type[LogicalLine]]
 COMMENT_TOKEN: Final[int]
+# The release, as the package metadata gives it: "0.2.0".
+__version__: Final[str]
 
 @final
 @type_check_only
@@ -146,6 +150,9 @@ class CreateHook(Protocol):
         /,
     ) -> object: ...
 
+# Strings are read as feature_version, a (3, minor) tuple, reads them: by default (None) as
+# Python 3.10, where logicalline-dump reads as the newest version the module knows. Pass
+# feature_version=sys.version_info[:2] to read as the running interpreter does.
 def CreateLogicalLineParser(
     copy_strings: object = True,
     skip_whitespace_lines: object = True,

@@ -1,7 +1,11 @@
+import glob
+import importlib.metadata
 import io
 import json
 import os
 import pathlib
+import re
+import signal
 import socket
 import subprocess
 import sys
@@ -9,7 +13,7 @@ import sys
 import pytest
 
 import logicalline
-from logicalline_dump import dump, progress, reading
+from logicalline_dump import dump, progress, reading, source_to_utf8
 from logicalline_dump.workers import Workers
 from logicalline_dump.__main__ import PARSER_OPTIONS, main
 
@@ -208,3 +212,72 @@ def test_a_line_longer_than_a_window_is_dumped_once(tmp_path, capsys):
     records = [json.loads(record) for record in out.splitlines()]
     assert [(record["first_line"], record["line_count"])
             for record in records if "first_line" in record] == [(1, 40002), (40003, 1)]
+
+
+@pytest.mark.parametrize("jobs", ["1", "2"])
+def test_ctrl_c_ends_the_run_with_one_line(tmp_path, jobs):
+    for number in range(8):
+        (tmp_path / f"f{number}.py").write_bytes(CLOSED * 3000)
+    scratch = tmp_path / "scratch"
+    scratch.mkdir()
+    # A session of its own, so that the Ctrl-C reaches the tool and its workers, as a terminal's
+    # does. The tool is mid-run once it has written, and stays so: nobody reads on yet.
+    tool = subprocess.Popen([sys.executable, "-m", "logicalline_dump", "-j", jobs, str(tmp_path)],
+                            stdout=subprocess.PIPE, stderr=subprocess.PIPE,
+                            env={**os.environ, "TMPDIR": str(scratch)}, start_new_session=True)
+    tool.stdout.read(1)
+    os.killpg(tool.pid, signal.SIGINT)
+    _, err = tool.communicate()
+    assert (tool.returncode, err) == (130, b"logicalline-dump: interrupted\n")
+    assert list(scratch.iterdir()) == []
+    with pytest.raises(ProcessLookupError):  # no worker outlives the tool
+        os.killpg(tool.pid, 0)
+
+
+def test_one_version_everywhere(capsys):
+    root = pathlib.Path(__file__).resolve().parent.parent
+    declared = re.search(r'^version = "(.+)"$', (root / "pyproject.toml").read_text(), re.M)[1]
+    assert logicalline.__version__ == declared
+    assert main(["--version"]) == 0 and capsys.readouterr().out == f"logicalline-dump {declared}\n"
+    try:
+        package = importlib.metadata.distribution("logicalline")
+    except importlib.metadata.PackageNotFoundError:  # a build tree, with no metadata
+        return
+    module = pathlib.Path(logicalline.__file__).resolve()
+    if any(pathlib.Path(package.locate_file(name)).resolve() == module for name in package.files):
+        assert package.version == declared
+
+
+@pytest.mark.parametrize("data", [
+    b"s = '\xff'\n",  # not UTF-8, with no declaration
+    b"# coding: cp1252\ns = '\x81'\n",  # a byte that the declared encoding leaves undefined
+    b"# coding: unicode_escape\ns = '\\udc80'\n",  # an escape to a lone surrogate
+])
+def test_decoding_reads_on_where_the_interpreter_stops(data):
+    with pytest.raises(SyntaxError):
+        compile(data, "x.py", "exec")
+    line = logicalline.CreateLogicalLineParser().GetLogicalLineListFromBuffer(source_to_utf8(data))
+    assert "\ufffd" in line[-1].fTokens[2][0]
+
+
+@pytest.mark.skipif(sys.version_info < (3, 12), reason="3.10 and 3.11 read as by default")
+def test_reading_as_this_interpreter_is_reading_as_the_newest_version():
+    # What the README tells a tool author to check their results against the dump tool with.
+    running = logicalline.CreateLogicalLineParser(feature_version=sys.version_info[:2])
+    newest = logicalline.CreateLogicalLineParser(
+        feature_version=logicalline.kNewestFeatureVersion)
+    files = sorted(glob.glob(os.path.join(os.path.dirname(os.__file__), "**", "*.py"),
+                             recursive=True))
+    compiled = 0
+    for path in (path for path in files[::25] if "-packages" not in path):
+        data = pathlib.Path(path).read_bytes()
+        try:
+            compile(data, path, "exec")
+        except (SyntaxError, ValueError):
+            continue  # this interpreter refuses it, so it may read either way
+        compiled += 1
+        assert [(x.fType, x.fIncomplete, x.fLineCount, x.fTokens)
+                for x in running.GetLogicalLineListFromBuffer(data)] == [
+            (x.fType, x.fIncomplete, x.fLineCount, x.fTokens)
+            for x in newest.GetLogicalLineListFromBuffer(data)], path
+    assert compiled > 40

@@ -1,12 +1,14 @@
-"""Companion of the logicalline module: a dump tool for logical lines, and the location of the
-C header that declares the module's direct function table."""
+"""Companion of the logicalline module: a dump tool for logical lines, the decoding that it reads
+files with, and the location of the C header that declares the module's direct function table."""
 
 import os
 
-__all__ = ["logicalline_include"]
+from .reading import source_to_utf8
+
+__all__ = ["logicalline_include", "source_to_utf8"]
 
 
-def logicalline_include():
+def logicalline_include() -> str:
     """Return the directory that holds logicalline_direct.h, for building host extensions."""
     here = os.path.dirname(os.path.abspath(__file__))
     installed = os.path.join(here, "include")

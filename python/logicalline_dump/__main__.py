@@ -3,11 +3,10 @@
 With no argument it dumps a bundled sample; given files or directories (walked
 for *.py), it dumps each one, and "-" reads a source from stdin.
 
-A file is decoded as the interpreter would: byte-order mark, else coding
-declaration, else UTF-8. A declaration that the interpreter refuses (an
-unknown or non-text encoding, or one that contradicts a byte-order mark) fails
-the file with the interpreter's message. Bytes that do not decode are read on,
-shown as U+FFFD, where the interpreter would stop.
+A file is decoded as the interpreter would (byte-order mark, else coding
+declaration, else UTF-8) by logicalline_dump.source_to_utf8. Bytes that do not
+decode are read on, shown as U+FFFD, where the interpreter would stop; a
+declaration that the interpreter refuses fails the file with its message.
 
 Line numbers count from 1 everywhere: in the text, the JSON and the error
 messages. Columns are byte offsets from 0 into the line's UTF-8 text. A file
@@ -27,49 +26,34 @@ logical line:
    "tabs_in_indent", "spaces_in_indent", "incomplete", "name", "text",
    "tokens": [[text, line, column], ...]}
 then, after its lines, one closing record per input file, even an empty one:
-  {"path", "logical_lines": N}, N being the number of its line records, with
-  "error": MESSAGE too if it could not be read, decoded or parsed;
+  {"path", "logical_lines": N}, with "error": MESSAGE if it failed;
 and {"path", "error"} for a directory that held no .py file or could not be
-listed. A file name that is not UTF-8 adds "path_hex" to each record: the hex
-of its bytes, bytes.fromhex(path_hex). With --summary, one object instead:
+listed. A file name that is not UTF-8 adds "path_hex", the hex of its bytes.
+With --summary, one object instead:
   {"counts": {TYPE: N, ...}, "lines", "files", "bytes", "seconds",
    "errors": [{"path", "error"}, ...]}
 
---summary prints counts per line type, then the files, MB and speed, and how
-many inputs failed. --options NAME=BOOL,... sets the parser options (all on by
-default): copy_strings, skip_whitespace_lines, remove_comments,
-include_line_text; BOOL is 1/0, true/false, yes/no or on/off.
+--options takes NAME=BOOL,... for copy_strings, skip_whitespace_lines,
+remove_comments and include_line_text (all on by default); BOOL is 1/0,
+true/false, yes/no or on/off.
 
---jobs N parses in N worker processes (0: one per core); the output is byte
-for byte that of a serial run. It pays on idle cores from about a MB of
-source. Measured on 2 idle cores and the 3.10 standard library (30 MB), -j 2
-took 0.51 to 0.52 of the wall time of -j 1 for 1.00 to 1.02 times its CPU
-time (text, --json; 0.58 and 1.04 with --summary), and 0.64 of it on 1.7 MB
-of that library; on 0.05 MB it took 1.2 times as long. With the other core
-busy it gained 3%.
+--jobs N writes byte for byte what a serial run writes; it pays on large
+inputs and idle cores. A file is read in windows and each logical line is
+released once written, so memory follows the biggest file, not the run. On a
+terminal, a run longer than a second shows its progress on stderr, unless
+--quiet or the dump goes to that terminal too.
 
-Memory: one file is read at a time, in windows of 20,000 physical lines, and
-each logical line is written in turn and then released. Measured on Python
-3.10 and 3.13, the peak grew by at most 20 bytes per byte of the biggest file
-when dumping the standard library, and by at most 130 per byte for a 10 MB
-file of one line of 3.3 million numbers, 125 of them the module's own tokens
-of that line. Each --jobs worker holds as much for the files it reads.
-
-On a terminal a run longer than a second shows its progress on stderr (files
-done, MB/s, time left; a bar with pip install 'logicalline[tools]'), unless
---quiet or stdout is that terminal too and the dump would scroll it away.
-
-Exit status: 0 when every input was dumped, 1 when any could not be read,
-decoded or parsed, or a directory held no .py file (each is reported on
-stderr, after what was dumped of it, and the rest are still dumped), 2 for a
-usage error. Output cut short by a closed pipe ends quietly with status 141,
-as for other filters.
+Exit status: 0 when every input was dumped; 1 when any could not be read,
+decoded or parsed, or a directory held no .py file (each is reported on stderr
+and the rest are still dumped); 2 for a usage error; 130 after Ctrl-C; 141 when
+the reader of the output goes away (| head, say).
 """
 
 import argparse
 import collections
 import json
 import os
+import signal
 import sys
 import time
 
@@ -78,6 +62,7 @@ import logicalline
 from . import progress
 from .dump import ParallelDump, dump_file
 from .reading import STDIN, find_sources, path_fields
+from .workers import interrupts_held
 
 SAMPLE = os.path.join(os.path.dirname(os.path.abspath(__file__)), "sample.py")
 PARSER_OPTIONS = ("copy_strings", "skip_whitespace_lines", "remove_comments", "include_line_text")
@@ -124,6 +109,10 @@ def file_size(path):
         return 0
 
 
+def plural(count, noun):
+    return f"{count} {noun}" if count == 1 else f"{count} {noun}s"
+
+
 def write_summary(counts, files, size, elapsed, failures, as_json, out):
     if as_json:
         out.write(json.dumps({"counts": dict(counts.most_common()), "lines": sum(counts.values()),
@@ -134,11 +123,12 @@ def write_summary(counts, files, size, elapsed, failures, as_json, out):
     for name, count in counts.most_common():
         out.write(f"{name:<20} {count:>9}\n")
     out.write(f"{'lines':<20} {sum(counts.values()):>9}\n")
-    out.write(f"{files} files, {size / 1e6:.2f} MB in {elapsed:.3f} s: {files / elapsed:.0f} "
-              f"files/s, {size / 1e6 / elapsed:.1f} MB/s; {len(failures)} failed\n")
+    out.write(f"{plural(files, 'file')}, {size / 1e6:.2f} MB in {elapsed:.3f} s: "
+              f"{files / elapsed:.0f} files/s, {size / 1e6 / elapsed:.1f} MB/s; "
+              f"{len(failures)} failed\n")
 
 
-def main(argv=None):
+def argument_parser():
     arguments = argparse.ArgumentParser(
         prog="logicalline-dump", description=__doc__.split("\n\n")[0],
         epilog=__doc__.split("\n\n", 1)[1], formatter_class=argparse.RawDescriptionHelpFormatter)
@@ -157,10 +147,44 @@ def main(argv=None):
     arguments.add_argument("--jobs", "-j", type=parse_jobs, default=1, metavar="N",
                            help="parse in N worker processes, 0 for one per core (default: 1)")
     arguments.add_argument("--quiet", "-q", action="store_true", help="show no progress")
+    arguments.add_argument("--version", action="version",
+                           version=f"logicalline-dump {logicalline.__version__}")
+    return arguments
+
+
+def drop_output(out):
+    """Points out's file at devnull, so that what it still holds goes nowhere."""
     try:
-        options = arguments.parse_args(argv)
+        os.dup2(os.open(os.devnull, os.O_WRONLY), out.fileno())
+    except (OSError, ValueError):
+        pass
+
+
+def stop_once(signum, frame):
+    """Ctrl-C: ends the run once, and leaves the clean-up on the way out uninterrupted."""
+    signal.signal(signal.SIGINT, signal.SIG_IGN)
+    raise KeyboardInterrupt
+
+
+def main(argv=None):
+    try:
+        options = argument_parser().parse_args(argv)
     except SystemExit as leaving:  # usage errors and --help, returned for in-process callers
         return leaving.code
+    previous = signal.signal(signal.SIGINT, stop_once)
+    try:
+        return dump(options)
+    except KeyboardInterrupt:  # the workers and their files are gone by now
+        # What is still buffered stays unwritten: a reader that has stopped reading would hold
+        # the flush at exit for good, with Ctrl-C no longer heard.
+        drop_output(sys.stdout)
+        sys.stderr.write("logicalline-dump: interrupted\n")
+        return 130
+    finally:
+        signal.signal(signal.SIGINT, previous)
+
+
+def dump(options):
     settings = {}
     for chosen in options.options:
         settings.update(chosen)
@@ -189,7 +213,9 @@ def main(argv=None):
             results = (dump_file(parser, style, path, emit, display.moved) for path in sources)
         else:
             out.flush()  # before the workers start, so that they inherit no pending output
-            parallel = ParallelDump(parser, settings, style, sources, sizes, options.jobs, out)
+            with interrupts_held():  # so that a Ctrl-C finds them on record, to be ended
+                parallel = ParallelDump(parser, settings, style, sources, sizes, options.jobs,
+                                        out)
         display = progress.progress(len(sources), sum(sizes), not options.quiet and (
             sys.stderr.isatty() and (options.summary or not sys.stdout.isatty())))
         if parallel:
@@ -205,17 +231,13 @@ def main(argv=None):
             write_summary(counts, files, size, max(time.perf_counter() - start, 1e-9), failures,
                           options.json, out)
         out.flush()  # inside the try: with `| head` the last write may only fail here
-    except BrokenPipeError:
-        display.close()
-        # The reader has gone; point stdout at devnull so the flush at exit stays silent.
-        try:
-            os.dup2(os.open(os.devnull, os.O_WRONLY), out.fileno())
-        except (OSError, ValueError):
-            pass
+    except BrokenPipeError:  # the reader has gone: the flush at exit must stay silent
+        drop_output(out)
         return 141
     finally:
         if parallel:
             parallel.close()
+        display.close()
     return 1 if failures else 0
 
 

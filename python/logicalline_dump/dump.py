@@ -10,8 +10,8 @@ import tempfile
 
 import logicalline
 
-from .reading import STDIN, load, path_fields, to_utf8, windows
-from .workers import Workers
+from .reading import STDIN, load, path_fields, source_to_utf8, windows
+from .workers import Workers, interrupts_held
 
 # Tokens per write of one line's tokens: a line of millions of them is written in parts, so that
 # its output never stands whole in memory.
@@ -123,7 +123,7 @@ def dump_file(parser, style, path, emit, moved=lambda size: None):
     else:
         size, failure = len(raw), None
         try:
-            data, offset = to_utf8(raw), 0
+            data, offset = source_to_utf8(raw), 0
             del raw
             for number, (lines, reached) in enumerate(windows(parser, data)):
                 if number == 0 and style == "text":
@@ -196,7 +196,11 @@ class ParallelDump:
             parsers.append(logicalline.CreateLogicalLineParser(**settings))
 
         count = sum(sources[start] != STDIN for start, _ in self.runs)
-        self.workers = Workers(min(jobs, count), start_worker, dump_run)
+        try:
+            self.workers = Workers(min(jobs, count), start_worker, dump_run)
+        except BaseException:
+            shutil.rmtree(self.scratch, ignore_errors=True)
+            raise
 
     def output(self, number):
         return os.path.join(self.scratch, str(number))
@@ -240,6 +244,7 @@ class ParallelDump:
         os.remove(path)
 
     def close(self):
-        """Ends the workers and removes their files."""
-        self.workers.close()
-        shutil.rmtree(self.scratch, ignore_errors=True)
+        """Ends the workers and removes their files, with Ctrl-C held back until both are done."""
+        with interrupts_held():
+            self.workers.close()
+            shutil.rmtree(self.scratch, ignore_errors=True)

@@ -95,11 +95,14 @@ def normal_name(name):
     return name
 
 
-def to_utf8(data):
-    """Decodes data as the interpreter would (byte-order mark, coding declaration, else UTF-8)
-    and returns it as UTF-8, which is all the module reads. A declaration that the interpreter
-    refuses raises ValueError with the interpreter's message. Bytes that do not decode stay
-    malformed in UTF-8 and become U+FFFD in another encoding, so that the module reads on."""
+def source_to_utf8(data: bytes) -> bytes:
+    """Returns Python source bytes as the UTF-8 that logicalline reads, decoded as the interpreter
+    decodes them: by a byte-order mark, else a coding declaration on the first two lines, else as
+    UTF-8. Where the interpreter would stop, this reads on: bytes that do not decode stay
+    malformed in UTF-8, or become U+FFFD in another encoding, and the module shows them as
+    U+FFFD. Raises ValueError, with the interpreter's message, only for a declaration that the
+    interpreter refuses: an unknown or non-text encoding, or one that contradicts a byte-order
+    mark."""
     bom = data.startswith(BOM)
     name = declared_encoding(data, len(BOM) if bom else 0)
     if name is None or normal_name(name) == "utf-8":
@@ -118,7 +121,8 @@ def to_utf8(data):
             text = data.decode(name, "replace")
     except (LookupError, UnicodeError) as error:  # not a text encoding, or one that reads nothing
         raise ValueError(str(error) or f"cannot decode with {name}") from None
-    return text.encode()
+    # A codec that makes lone surrogates (an escape codec) leaves them as malformed UTF-8 too.
+    return text.encode("utf-8", "surrogatepass")
 
 
 def read_lines(parser, data, offset, first_line, line_count):

@@ -3,6 +3,7 @@ up another: no imports or set-up beyond the fork, and a few bytes of pickle per 
 A worker starts with everything this process holds at the fork, so a task can be a few numbers
 that point into it."""
 
+import contextlib
 import gc
 import os
 import pickle
@@ -35,6 +36,18 @@ def receive(fd):
     """Returns the next value sent down fd; raises EOFError at its end."""
     (size,) = HEADER.unpack(read_exactly(fd, HEADER.size))
     return pickle.loads(read_exactly(fd, size))
+
+
+@contextlib.contextmanager
+def interrupts_held():
+    """Holds Ctrl-C (SIGINT) back for the block, so that what the block starts is on record
+    before KeyboardInterrupt can leave it: a Ctrl-C meanwhile is raised as the block ends. A
+    process forked inside starts with it held too, until it chooses what to do with it."""
+    held = signal.pthread_sigmask(signal.SIG_BLOCK, {signal.SIGINT})
+    try:
+        yield
+    finally:
+        signal.pthread_sigmask(signal.SIG_SETMASK, held)
 
 
 class Worker:
@@ -87,21 +100,26 @@ class Workers:
         gc.freeze()
         try:
             for _ in range(count):
-                self.workers.append(self.spawn(start, work))
+                self.spawn(start, work)
+        except BaseException:  # Ctrl-C or a failed fork: no worker is left running
+            self.close()
+            raise
         finally:
             gc.unfreeze()
 
     def spawn(self, start, work):
-        tasks_read, tasks_write = os.pipe()
-        answers_read, answers_write = os.pipe()
-        pid = os.fork()
-        if pid == 0:
-            others = [fd for worker in self.workers for fd in (worker.tasks, worker.answers)]
-            run_worker(tasks_read, answers_write, [tasks_write, answers_read, *others], start,
-                       work)
-        os.close(tasks_read)
-        os.close(answers_write)
-        return Worker(pid, tasks_write, answers_read)
+        """Forks a worker and puts it on record before a Ctrl-C can interrupt this process."""
+        with interrupts_held():
+            tasks_read, tasks_write = os.pipe()
+            answers_read, answers_write = os.pipe()
+            pid = os.fork()
+            if pid == 0:
+                others = [fd for worker in self.workers for fd in (worker.tasks, worker.answers)]
+                run_worker(tasks_read, answers_write, [tasks_write, answers_read, *others], start,
+                           work)
+            self.workers.append(Worker(pid, tasks_write, answers_read))
+            os.close(tasks_read)
+            os.close(answers_write)
 
     def send(self, task):
         """Sends the task to the worker with the fewest pending; returns that worker."""
