@@ -14,6 +14,7 @@ import pytest
 
 import logicalline
 from test_direct_table import DIRECT
+from test_leaks import MALLINFO2
 from test_model_agreement import read
 
 import direct_table  # noqa: E402  (put on the path by test_direct_table)
@@ -164,17 +165,10 @@ def test_two_workers_read_the_standard_library_as_the_main_interpreter(request):
     assert found == summaries.summarize([path for batch in batches for path in batch])
 
 
-class Heap(ctypes.Structure):  # glibc's struct mallinfo2
-    _fields_ = [(name, ctypes.c_size_t) for name in "arena ordblks smblks hblks hblkhd usmblks "
-                "fsmblks uordblks fordblks keepcost".split()]
-
-
 def memory():
     """(resident bytes, C heap bytes in use) of the process."""
     gc.collect()
-    mallinfo2 = ctypes.CDLL(None).mallinfo2
-    mallinfo2.restype = Heap
-    heap = mallinfo2()
+    heap = MALLINFO2()
     with open("/proc/self/statm") as statm:
         resident = int(statm.read().split()[1]) * os.sysconf("SC_PAGE_SIZE")
     return resident, heap.uordblks + heap.hblkhd
