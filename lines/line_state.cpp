@@ -33,10 +33,11 @@ int VisitLineState(LineState* shared, visitproc visit, void* arg) {
   return 0;
 }
 
+// The hook goes first: releasing it may run host code, which may still read.
 void ClearLineState(LineState* shared) {
-  Py_CLEAR(shared->fLineType);
   DropCreateHook(shared);
   ReleaseSharedTables(shared);
+  Py_CLEAR(shared->fLineType);
 }
 
 void ReleaseSharedTables(LineState* shared) {
