@@ -15,7 +15,7 @@ import pytest
 import logicalline
 from test_direct_table import DIRECT
 from test_leaks import MALLINFO2
-from test_model_agreement import read
+from test_model_agreement import read, run_isolated
 
 import direct_table  # noqa: E402  (put on the path by test_direct_table)
 
@@ -153,6 +153,19 @@ def test_a_hook_is_called_by_its_own_interpreter_only():
         first("assert read() == ['first']")
         legacy("assert read() == ['legacy']")
     assert type(read(b"x\n")[0]) is logicalline.LogicalLineType  # nor once they are gone
+
+
+def test_a_hook_installed_in_a_legacy_interpreter_stays_there():  # on every version
+    pytest.importorskip("_testcapi", reason="the interpreter's test module makes the interpreter")
+    done = run_isolated(r"""
+import io, _testcapi, logicalline
+from test_subinterpreters import PRELUDE, READER
+hook = "logicalline.SetLogicalCreateFunction(lambda *parts: 'legacy')\n"
+assert _testcapi.run_in_subinterp(PRELUDE + READER + hook + "assert read() == ['legacy']") == 0
+line = logicalline.CreateLogicalLineParser().GetLogicalLineList(io.BytesIO(b"x\n").readline)[0]
+assert type(line) is logicalline.LogicalLineType, line
+""")
+    assert done.returncode == 0, done.stderr
 
 
 @needs_pool
