@@ -86,10 +86,11 @@ int VisitState(ModuleState* state, visitproc visit, void* arg) {
   return state->fShared ? VisitLineState(state->fShared, visit, arg) : 0;
 }
 
+// The lines' state first, which releases the create hook before anything else.
 void ClearState(ModuleState* state) {
+  if (state->fShared) ClearLineState(state->fShared);
   Py_CLEAR(state->fParserType);
   for (PyObject*& constant : state->fLineTypes) Py_CLEAR(constant);
-  if (state->fShared) ClearLineState(state->fShared);
 }
 
 void FreeState(ModuleState* state) {
