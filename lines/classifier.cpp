@@ -10,6 +10,7 @@
 
 #include "core/token_ids.h"
 #include "tokenizer/operator_table.h"
+#include "tokenizer/string_prefixes.h"
 #include "tokenizer/token_queries.h"
 #include "tokenizer/token_start.h"
 #include "tokenizer/token_text.h"
@@ -81,7 +82,7 @@ int ScanDefinedName(PyObject* const* tokens, int key, int count, LineType* type,
 enum class Lead : uint8_t {
   kOther,
   kQuote,      // a string literal
-  kPrefix,     // R, U, r, u: a string literal when a quote follows
+  kPrefix,     // the letter of a plain str prefix (r, u): a string literal when a quote follows
   kEquals,     // "=" alone is an assignment at depth 0
   kBackslash,  // "\\" alone is a continuation, passed over
 };
@@ -90,7 +91,9 @@ struct LeadTable {
   Lead fRows[256];
   constexpr LeadTable() : fRows() {
     for (unsigned char quote : {'"', '\''}) fRows[quote] = Lead::kQuote;
-    for (unsigned char prefix : {'R', 'U', 'r', 'u'}) fRows[prefix] = Lead::kPrefix;
+    for (unsigned b = 0; b < 256; b++) {
+      if (kPlainStringLetters.Has(b)) fRows[b] = Lead::kPrefix;
+    }
     fRows[static_cast<unsigned char>('=')] = Lead::kEquals;
     fRows[static_cast<unsigned char>('\\')] = Lead::kBackslash;
   }
