@@ -59,6 +59,16 @@ const StatementWord* FindStatementWord(const TokenText& text) {
 
 bool IsSkippedLeader(const TokenText& text) { return text.Is("\\") || text.Is("async"); }
 
+// Returns the index of the "import" or "from" that a key token "lazy" stands before, past any
+// line continuations, or `key` when it stands before neither: then "lazy" is a name.
+int KeyAfterLazy(PyObject* const* tokens, int key, int count) {
+  int next = key + 1;
+  while (next < count && TokenText(tokens[next]).Is("\\")) next++;
+  if (next == count) return key;
+  const TokenText text(tokens[next]);
+  return text.Is("import") || text.Is("from") ? next : key;
+}
+
 // Finds the defined name after the key token of a class or function definition; a line with
 // no name before its parameter list, base list or colon is no definition.
 int ScanDefinedName(PyObject* const* tokens, int key, int count, LineType* type,
@@ -130,7 +140,7 @@ LineType ScanAssignmentOrStrings(PyObject* const* tokens, int count) {
 
 }  // namespace
 
-int ClassifyLogicalLine(PyObject* const* tokens, int count, LineType* type,
+int ClassifyLogicalLine(PyObject* const* tokens, int count, bool lazyImports, LineType* type,
                         PyObject** localScopeName) {
   int key = 0;
   while (key < count && IsSkippedLeader(TokenText(tokens[key]))) key++;
@@ -138,6 +148,7 @@ int ClassifyLogicalLine(PyObject* const* tokens, int count, LineType* type,
     *type = kBlankLine;
     return 0;
   }
+  if (lazyImports && TokenText(tokens[key]).Is("lazy")) key = KeyAfterLazy(tokens, key, count);
   const TokenText keyText(tokens[key]);
   if (const StatementWord* row = FindStatementWord(keyText)) {
     *type = row->fType;

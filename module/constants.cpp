@@ -7,6 +7,7 @@
 #include "core/py_ref.h"
 #include "core/token_ids.h"
 #include "lines/logical_line.h"
+#include "module/parser.h"
 
 LineTypeRow LineTypeTable[kLineTypeCount] = {
     {"kUnknown", "unknown", nullptr},
@@ -84,6 +85,8 @@ int AddModuleConstants(PyObject* dict) {
   if (PyDict_SetItemString(dict, "LogicalLineType", reinterpret_cast<PyObject*>(&LogicalLineType)) != 0)
     return -1;
   PyRef comment = PyRef::Steal(PyLong_FromLong(COMMENT_TOKEN));
-  if (!comment) return -1;
-  return PyDict_SetItemString(dict, "COMMENT_TOKEN", comment.Get());
+  if (!comment || PyDict_SetItemString(dict, "COMMENT_TOKEN", comment.Get()) != 0) return -1;
+  PyRef newest = PyRef::Steal(NewestFeatureVersion());
+  if (!newest) return -1;
+  return PyDict_SetItemString(dict, "kNewestFeatureVersion", newest.Get());
 }

@@ -48,6 +48,9 @@ kGenericAttribInfo: Final[tuple[str, None]]
 
 LogicalLineType: Final[type[LogicalLine]]
 COMMENT_TOKEN: Final[int]
+# The newest (major, minor) that feature_version reads as that version does; later ones read
+# as it does.
+kNewestFeatureVersion: Final[tuple[int, int]]
 
 @final
 @type_check_only

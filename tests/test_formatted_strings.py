@@ -118,7 +118,7 @@ U_AND_R = ["x", "=", "ur", "'a'", "+", "Ru", "'''b\nc'''", "+", "uR", "+", "bu",
 
 
 @pytest.mark.parametrize("version, tokens", [
-    (None, CLASSIC_U_AND_R), ((3, 11), CLASSIC_U_AND_R), ((3, 12), U_AND_R), ((3, 14), U_AND_R)])
+    (None, CLASSIC_U_AND_R), ((3, 11), CLASSIC_U_AND_R), ((3, 12), U_AND_R), ((3, 15), U_AND_R)])
 def test_u_and_r_together_are_a_name_before_a_string_from_312(version, tokens):
     source = b"x = ur'a' + Ru'''b\nc''' + uR + bu'd'\n"
     lines = logicalline.CreateLogicalLineParser(
@@ -228,7 +228,7 @@ def test_standard_library_strings_agree_with_the_interpreter(request):
 
 
 @pytest.mark.skipif(RUNNING >= (3, 12), reason="tells code valid before 3.12 by compiling it")
-def test_code_valid_before_312_reads_the_same_with_the_option(request):
+def test_code_valid_before_312_reads_the_same_with_the_newest_option(request):
     compared = 0
     for data in stdlib_sources(request):
         try:
@@ -240,7 +240,8 @@ def test_code_valid_before_312_reads_the_same_with_the_option(request):
         for options in ({}, {"remove_comments": False, "copy_strings": False}):
             want = logicalline.CreateLogicalLineParser(**options).GetLogicalLineListFromBuffer(data)
             got = logicalline.CreateLogicalLineParser(
-                **options, feature_version=(3, 14)).GetLogicalLineListFromBuffer(data)
+                **options, feature_version=logicalline.kNewestFeatureVersion
+            ).GetLogicalLineListFromBuffer(data)
             assert [(l.fType, l.fIncomplete, l.fLineCount, l.fTokens) for l in got] == [
                 (l.fType, l.fIncomplete, l.fLineCount, l.fTokens) for l in want], data[:200]
         compared += 1
@@ -250,9 +251,13 @@ def test_code_valid_before_312_reads_the_same_with_the_option(request):
 def test_dump_reads_as_the_newest_python_unless_told(tmp_path, capsys):
     from logicalline_dump.__main__ import main
     path = tmp_path / "new.py"
-    path.write_bytes(b"x = f'{'a'}'\n")
+    path.write_bytes(b"x = f'{'a'}'\nlazy import y\n")
     assert main(["--json", "--jobs", "2", str(path)]) == 0
-    assert "[\"f'{'a'}'\", 1, 4]" in capsys.readouterr().out
+    out = capsys.readouterr().out
+    assert "[\"f'{'a'}'\", 1, 4]" in out and '"type": "kImport"' in out
+    assert main(["--json", "--python", "3.14", str(path)]) == 0
+    out = capsys.readouterr().out
+    assert "[\"f'{'a'}'\", 1, 4]" in out and '"type": "kImport"' not in out
     assert main(["--json", "--python", "3.11", str(path)]) == 0
     assert "[\"f'{'\", 1, 4]" in capsys.readouterr().out
     assert main(["--python", "3", str(path)]) == 2
