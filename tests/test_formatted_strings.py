@@ -67,23 +67,37 @@ def assert_spans_agree(data, spans, minor):
     return len(spans)
 
 
-# Valid since 3.12: what the fields of an f-string may hold, and what ends them.
+# Valid since 3.12: what the fields of an f-string may hold, and what ends them; each source
+# with its strings, as the interpreter's tokenize spans them.
 CASES = [
-    b"f'{f' {d}\\n' if d else ''} def {name}(x)'\n",   # the quote of the string itself
-    b"x = f'({', '.join(args)})' + y\n",
-    b"s = f\"{a +\n b}\" + f'{c\n}'\ny = 1\n",          # line breaks in single-quoted strings
-    b"f'{x # it's a comment, \"}\" too\n  + 1}'\n",
-    b"f'{x:{width}.{precision}f} {y!r:>{w}} {z=} {z = !s:^9}'\n",
-    b"f'{a!=b} {x:=5} {(x:=5)} {d[1:2]} {lambda: 1} {({1: 2})[1]}'\n",
-    b"f'{{}} {{{x}}} }}{{ \\N{BULLET} {x:{y}}}}'\n",
-    b"rf'\\{x}\\N{y}' Rf\"\\\"{'q'}\" fR'''{x\n}\\\\''' + 1\n",
-    b"x = rf\"\\N{'\"'}\" + 1\n",                         # no named escape in a raw string
-    b'f"""{x:a\n\'b\'} {"""\ndoc"""} #{{\n"""\n',          # a line break ends a format spec
-    b"f'{f'{f'{f'{1}'}'}'}' f'{\"\\\\\"}' f'{x}' 'tail'\n",
-    b"print(f'caf\xc3\xa9 {\xc3\xa9t\xc3\xa9!a}', f\"{'}'}\")\n",
-    b"f'{x\\\n}' f'a\\\nb{y}'\n",                      # backslash continuations
-    b"d = {f'{k}': v for k, v in f(f'''{\n  a}''')}\r\nz = 1\r\n",
+    (b"f'{f' {d}\\n' if d else ''} def {name}(x)'\n",   # the quote of the string itself
+     ["f'{f' {d}\\n' if d else ''} def {name}(x)'"]),
+    (b"x = f'({', '.join(args)})' + y\n", ["f'({', '.join(args)})'"]),
+    (b"s = f\"{a +\n b}\" + f'{c\n}'\ny = 1\n",          # line breaks in single-quoted strings
+     ["f\"{a +\n b}\"", "f'{c\n}'"]),
+    (b"f'{x # it's a comment, \"}\" too\n  + 1}'\n", ["f'{x # it's a comment, \"}\" too\n  + 1}'"]),
+    (b"f'{x:{width}.{precision}f} {y!r:>{w}} {z=} {z = !s:^9}'\n",
+     ["f'{x:{width}.{precision}f} {y!r:>{w}} {z=} {z = !s:^9}'"]),
+    (b"f'{a!=b} {x:=5} {(x:=5)} {d[1:2]} {lambda: 1} {({1: 2})[1]}'\n",
+     ["f'{a!=b} {x:=5} {(x:=5)} {d[1:2]} {lambda: 1} {({1: 2})[1]}'"]),
+    (b"f'{{}} {{{x}}} }}{{ \\N{BULLET} {x:{y}}}}'\n", ["f'{{}} {{{x}}} }}{{ \\N{BULLET} {x:{y}}}}'"]),
+    (b"rf'\\{x}\\N{y}' Rf\"\\\"{'q'}\" fR'''{x\n}\\\\''' + 1\n",
+     ["rf'\\{x}\\N{y}'", "Rf\"\\\"{'q'}\"", "fR'''{x\n}\\\\'''"]),
+    (b"x = rf\"\\N{'\"'}\" + 1\n", ["rf\"\\N{'\"'}\""]),    # no named escape in a raw string
+    (b'f"""{x:a\n\'b\'} {"""\ndoc"""} #{{\n"""\n',          # a line break ends a format spec
+     ['f"""{x:a\n\'b\'} {"""\ndoc"""} #{{\n"""']),
+    (b"f'{f'{f'{f'{1}'}'}'}' f'{\"\\\\\"}' f'{x}' 'tail'\n",
+     ["f'{f'{f'{f'{1}'}'}'}'", "f'{\"\\\\\"}'", "f'{x}'", "'tail'"]),
+    (b"print(f'caf\xc3\xa9 {\xc3\xa9t\xc3\xa9!a}', f\"{'}'}\")\n", ["f'caf\xe9 {\xe9t\xe9!a}'", "f\"{'}'}\""]),
+    (b"f'{x\\\n}' f'a\\\nb{y}'\n", ["f'{x\\\n}'", "f'a\\\nb{y}'"]),  # backslash continuations
+    (b"d = {f'{k}': v for k, v in f(f'''{\n  a}''')}\r\nz = 1\r\n", ["f'{k}'", "f'''{\n  a}'''"]),
 ]
+
+
+def string_tokens(data, minor):
+    """The texts of the string tokens of the module's reading."""
+    return [text for line in parser(minor).GetLogicalLineListFromBuffer(data)
+            for i, (text, _) in enumerate(line.fTokens) if line.GetTokenType(i) == 3]
 
 
 def as_template(data):
@@ -92,16 +106,25 @@ def as_template(data):
                   lambda m: m[1] + (b"t" if m[2] == b"f" else b"T") + m[3], data)
 
 
+def templates(cases):
+    return [(as_template(data), [as_template(s.encode()).decode() for s in strings])
+            for data, strings in cases]
+
+
+@pytest.mark.parametrize("data, strings", CASES + templates(CASES))
+def test_outermost_strings_are_one_token_each(data, strings):
+    assert string_tokens(data, 14) == strings
+
+
 @needs_string_tokens
 def test_outermost_strings_are_tokens_as_the_interpreter_spans_them():
-    cases = CASES + [as_template(data) for data in CASES] * (RUNNING >= (3, 14))
-    for data in cases:
+    for data, strings in CASES + (templates(CASES) if RUNNING >= (3, 14) else []):
         spans = string_spans(data)
-        assert spans, data  # every case is valid, and holds strings
+        assert [text for _, _, text in spans] == strings  # the table reads as the interpreter
         assert_spans_agree(data, spans, RUNNING[1])
 
 
-@pytest.mark.parametrize("data", CASES)
+@pytest.mark.parametrize("data", [data for data, _ in CASES])
 def test_template_strings_read_as_the_formatted_strings_they_mirror_from_314(data):
     template = as_template(data)
     formatted = parser(13).GetLogicalLineListFromBuffer(data)
