@@ -16,6 +16,7 @@ struct LogicalLineParser {
   const OperatorTable* fOperatorTable;  // always the module's one table
   int fIncludeLineText;      // lines carry their source text
   StringRules fStringRules;  // the interpreter version whose strings the parser reads
+  int fLazyImports;          // "lazy import" and "lazy from" begin imports
 };
 
 extern PyTypeObject LogicalLineParserType;
@@ -29,3 +30,7 @@ PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObje
 
 // The options of a parser, as the reader takes them.
 ReadOptions ParserOptions(PyObject* parser);
+
+// Returns a new (3, minor) tuple of the newest interpreter version whose reading the parser
+// knows; every later version reads as it does. nullptr with an exception set on failure.
+PyObject* NewestFeatureVersion();

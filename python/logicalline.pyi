@@ -50,6 +50,9 @@ kGenericAttribInfo: Final[tuple[str, None]]
 
 LogicalLineType: Final[type[LogicalLine]]
 COMMENT_TOKEN: Final[int]
+# The newest (major, minor) that feature_version reads as that version does; later ones read
+# as it does.
+kNewestFeatureVersion: Final[tuple[int, int]]
 # The release, as the package metadata gives it: "0.2.0".
 __version__: Final[str]
 
