@@ -18,6 +18,10 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
     PyErr_SetString(PyExc_ValueError, "first line must be >= 0");
     return nullptr;
   }
+  if (lineCount < -1) {  // -1 alone means no limit; refused before the stream moves too
+    PyErr_SetString(PyExc_ValueError, "line count must be >= 0, or -1 for no limit");
+    return nullptr;
+  }
   return ReadLineList(ParserOptions(self), LineSource{.fReadline = readline,
                                                       .fData = data,
                                                       .fDataEnd = dataEnd,
