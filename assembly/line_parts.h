@@ -17,6 +17,8 @@ struct ReadOptions {
   bool fRemoveComments;       // comment tokens are not listed
   bool fIncludeLineText;      // the parts carry the line's source text
   StringRules fStringRules;   // how formatted strings are read
+  // Equal options read every text alike: an update reads with the options of the list's read.
+  bool operator==(const ReadOptions&) const = default;
 };
 
 // The parts of one logical line. Everything is borrowed from the reader, valid until it reads
