@@ -248,6 +248,12 @@ def test_an_update_reads_with_the_options_of_the_read(options):
         assert view(lines) == view(reader.GetLogicalLineListFromBuffer(text + b"y\n"))
 
 
+def test_text_after_a_last_line_without_a_line_feed_changes_that_line():
+    lines = PARSER.GetLogicalLineListFromBuffer(b"x = 1\ny = 2")
+    assert not outcome(lines, b"x = 1\ny = 23\nz\n", (2, 0, 2))
+    assert outcome(lines, b"x = 1\ny = 23\nz\n", (1, 1, 2))
+
+
 def test_the_record_keeps_the_text_as_read():
     data = bytearray(b"x = 1\ny = 2\n")
     lines = PARSER.GetLogicalLineList(io.BytesIO(data).readline)  # kept line by line
