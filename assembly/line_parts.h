@@ -18,6 +18,8 @@ struct ReadOptions {
   bool fIncludeLineText;      // the parts carry the line's source text
   StringRules fStringRules;   // how formatted strings are read
   bool fLazyImports;          // "lazy import" and "lazy from" begin imports
+  // Equal options read every text alike: an update reads with the options of the list's read.
+  bool operator==(const ReadOptions&) const = default;
 };
 
 // The parts of one logical line. Everything is borrowed from the reader, valid until it reads

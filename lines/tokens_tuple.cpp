@@ -180,7 +180,7 @@ PyObject* PositionTuple(TokenPosition position) {
   return made;
 }
 
-PyObject* LineTokens(LogicalLine* line) {
+PyObject* TokensTupleOf(LogicalLine* line) {
   if (!line->fTokensTuple) {
     PyObject* built = BuildTokensTuple(line);
     if (!built) return nullptr;

@@ -11,7 +11,7 @@
 PyObject* PositionTuple(TokenPosition position);
 
 // Returns the line's fTokens tuple, built at the first call and the same object after.
-PyObject* LineTokens(LogicalLine* line);
+PyObject* TokensTupleOf(LogicalLine* line);
 
 // Empties every table that reading shares: the entries and parts of fTokens, the token texts.
 void ReleaseSharedTables();

@@ -70,7 +70,7 @@ PyObject* GetBaseClassNames(PyObject* self, void*) {
 PyObject* GetLocalScopeName(PyObject* self, void*) {
   return ObjectOrNone(AsLine(self)->fLocalScopeName);
 }
-PyObject* GetTokens(PyObject* self, void*) { return LineTokens(AsLine(self)); }
+PyObject* GetTokens(PyObject* self, void*) { return TokensTupleOf(AsLine(self)); }
 PyObject* GetLineText(PyObject* self, void*) {
   const char* text = AsLine(self)->fLineText;
   if (!text) Py_RETURN_NONE;

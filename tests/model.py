@@ -314,9 +314,11 @@ def model_lines(physical_lines, copy_strings=True, skip_whitespace_lines=True,
     default or, with `newest`, as the newest Python reads code without f-strings or t-strings."""
     if first_line < 0:
         raise ValueError("first line must be >= 0")
+    if line_count < -1:
+        raise ValueError("line count must be >= 0, or -1 for no limit")
     opts = (copy_strings, skip_whitespace_lines, remove_comments, include_line_text)
     stop = first_line + line_count  # never wraps: counted wider than the arguments
-    stop = None if line_count == -1 or stop == -1 else stop
+    stop = None if line_count == -1 else stop
     src, lineno, result = Source(physical_lines), first_line, []
     while (stop is None or lineno < stop) and not src.at_end:
         line, lineno = build_logical_line(src, lineno, *map(bool, opts), newest)

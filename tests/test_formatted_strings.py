@@ -204,7 +204,7 @@ def test_token_queries_know_template_strings_only_on_lines_read_with_them():
 def test_every_entry_point_reads_with_the_option():
     old, new = b"a = 1\nx = f'{'b'}'\n", b"a = 2\nx = f'{'b'}'\ny = f'{\n 'c'}'\n"
     lines = parser(13).GetLogicalLineListFromBuffer(old)
-    parser(13).UpdateLogicalLineList(lines, new, 0, 2, 3)
+    parser(13).UpdateLogicalLineList(lines, new, 0, 2, 4)
     assert [l.fTokens for l in lines] == [l.fTokens for l in parser(13).GetLogicalLineList(
         io.BytesIO(new).readline)]
     assert lines[2].fTokens[2] == ("f'{\n 'c'}'", (0, 4))

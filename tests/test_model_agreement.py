@@ -144,8 +144,8 @@ def hostile_chunks(seed, nul=False, fragments=FRAGMENTS):
 def test_hostile_inputs(block):
     for seed in range(block * 100, block * 100 + 100):
         rng = random.Random(-seed)
-        # A negative first line is refused; first line + count = -1 means no stop line; past
-        # the largest line number is refused, never wrapped.
+        # A negative first line is refused, and so is a count below -1; past the largest line
+        # number is refused, never wrapped.
         window = rng.choice([(0, -1)] * 6 + [(7, -1), (0, 0), (3, 1), (0, 2), (5, 4), (0, -5),
                                              (-1, -1), (1, -2), (2**31 - 2, 3)])
         for opts in rng.sample(ALL_OPTIONS, 3):
