@@ -37,6 +37,8 @@ bool IsStatementKeyword(const TokenText& text) {
   return false;
 }
 
+bool IsImportWord(const TokenText& text) { return text.Is("import") || text.Is("from"); }
+
 bool LastTokenIsTrailingBackslash(const ReadingState* state) {
   const LineTokens& tokens = state->fTokens;
   const int last = tokens.fTokenCount - 1;
@@ -85,6 +87,8 @@ bool StartsNewStatement(const ReadingState* state, int k, int depthBefore) {
     if (k == 0) return true;
     return !AnyTokenIs(tokens, 0, k, "if");  // a conditional expression
   }
+  if (state->fOptions.fLazyImports && first.Is("lazy"))  // "lazy import", "lazy from"
+    return k + 1 < tokens.fTokenCount && IsImportWord(TextOf(tokens, k + 1));
   return IsStatementKeyword(first);
 }
 
@@ -108,6 +112,7 @@ bool FieldLineStartsStatement(const ReadingState* state, int k) {
     if (k >= kElseContinuesAfterTokens) return false;
     return !(strings.fWordsBeforeFirst & kIfWord) && !AnyTokenIs(tokens, 0, k, "if");
   }
+  if (state->fOptions.fLazyImports && first.Is("lazy")) return strings.fImportAfterFirst;
   return IsStatementKeyword(first);
 }
 
@@ -183,6 +188,7 @@ int BuildLogicalLine(ReadingState* state, LineParts* parts) {
                      .fIncomplete = open,
                      .fLineText = withText ? text.fData : nullptr,
                      .fLineTextLength = withText ? text.fLength : 0,
-                     .fOffset = offset};
+                     .fOffset = offset,
+                     .fLazyImports = state->fOptions.fLazyImports};
   return 1;
 }

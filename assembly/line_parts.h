@@ -19,6 +19,9 @@ struct ReadOptions {
   bool fRemoveComments;       // comment tokens are not listed
   bool fIncludeLineText;      // the parts carry the line's source text
   StringRules fStringRules;   // how formatted strings are read
+  bool fLazyImports;          // "lazy import" and "lazy from" begin imports
+  // Equal options read every text alike: an update reads with the options of the list's read.
+  bool operator==(const ReadOptions&) const = default;
 };
 
 // The parts of one logical line. Everything is borrowed from the reader, valid until it reads
@@ -36,4 +39,5 @@ struct LineParts {
   const char* fLineText;            // NUL-terminated UTF-8, or null
   size_t fLineTextLength;
   int64_t fOffset;                  // where the first physical line starts in the source
+  bool fLazyImports;                // read with lazy imports: the classifier takes them
 };

@@ -31,6 +31,11 @@ struct SourceLines {
   int64_t fPendingOffset;  // where the pending line starts in the source
   int64_t fLineOffset;     // where the physical line read last starts in the source
   TextBuffer fText;      // every physical line read for the logical line, line breaks included
+  // A copy of the whole text that readline hands out, for a list that updates keep; null when
+  // none is wanted, and never for a buffer, which is its own copy.
+  TextBuffer* fKept;
+  int fKeptOpen;    // 1 when the last piece kept ends without a line feed
+  int fCutAtFeeds;  // 1 while every piece kept is one line, cut as BytesIO.readline cuts it
 };
 
 constexpr int kInlineLineStarts = 8;

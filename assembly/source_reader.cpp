@@ -55,6 +55,22 @@ int NextPhysicalLine(SourceLines* source, PyRef* line, const char** bytes, Py_ss
   return 0;
 }
 
+// Copies a piece that readline handed out to the kept text, if one is kept. A piece is a line
+// as BytesIO.readline cuts one when it ends at its only line feed, or is the last. Returns 0, or
+// -1 with MemoryError set.
+int KeepPiece(SourceLines* source, const char* bytes, Py_ssize_t size) {
+  if (!source->fKept || size == 0) return 0;
+  const auto n = static_cast<size_t>(size);
+  const void* feed = memchr(bytes, '\n', n);
+  if (source->fKeptOpen || (feed && feed != bytes + n - 1)) source->fCutAtFeeds = 0;
+  source->fKeptOpen = feed == nullptr;
+  if (AppendBytes(source->fKept, bytes, n) != 0) {
+    PyErr_NoMemory();
+    return -1;
+  }
+  return 0;
+}
+
 }  // namespace
 
 void InitReadlineSource(SourceLines* source, PyObject* readline) {
@@ -69,7 +85,12 @@ void InitReadlineSource(SourceLines* source, PyObject* readline) {
   source->fPendingOffset = 0;
   source->fLineOffset = 0;
   InitTextBuffer(&source->fText);
+  source->fKept = nullptr;
+  source->fKeptOpen = 0;
+  source->fCutAtFeeds = 1;
 }
+
+void KeepSourceText(SourceLines* source, TextBuffer* kept) { source->fKept = kept; }
 
 void InitBufferSource(SourceLines* source, const char* data, const char* from,
                       const char* dataEnd, bool whole) {
@@ -113,7 +134,8 @@ int ReadSourceLine(SourceLines* source, int64_t lineNumber) {
   PyRef line;
   const char* bytes = nullptr;
   Py_ssize_t size = 0;
-  if (NextPhysicalLine(source, &line, &bytes, &size) != 0) return -1;
+  if (NextPhysicalLine(source, &line, &bytes, &size) != 0 || KeepPiece(source, bytes, size) != 0)
+    return -1;
   source->fLineOffset = source->fSourceOffset;
   source->fSourceOffset += size;
   if (source->fAtStart) {

@@ -15,6 +15,13 @@ void InitReadlineSource(SourceLines* source, PyObject* readline);
 void InitBufferSource(SourceLines* source, const char* data, const char* from,
                       const char* dataEnd, bool whole);
 
+// From now on, appends every piece that readline hands out to `kept` as well, and notes whether
+// the pieces are the text cut into lines as BytesIO.readline cuts it.
+void KeepSourceText(SourceLines* source, TextBuffer* kept);
+
+// True when the text kept so far was handed out as BytesIO.readline cuts it into lines.
+inline bool KeptTextIsCutAtFeeds(const SourceLines* source) { return source->fCutAtFeeds != 0; }
+
 // Frees the text and the pending line.
 void ReleaseSource(SourceLines* source);
 

@@ -259,7 +259,8 @@ int TokenizePhysicalLine(ReadingState* state, int lineStart) {
                     .fLineStart = text + lineStart,
                     .fLineEnd = text + TextLength(state),
                     .fPos = text + lineStart,
-                    .fAtEnd = 0};
+                    .fAtEnd = 0,
+                    .fRules = state->fOptions.fStringRules};
   const OperatorTable* table = state->fOptions.fOperatorTable;
   // Only the readings whose formatted strings nest take the longer way round each token.
   FormattedStrings* strings = nullptr;

@@ -144,7 +144,8 @@ def TestOneInput(data, with_hook=False):
         return
     except ValueError as e:
         assert (b"\0" in source and "Binary data encountered at lineno" in str(e)) or (
-            first < 0 and str(e) == "first line must be >= 0"), e
+            first < 0 and str(e) == "first line must be >= 0") or (
+            count < -1 and str(e) == "line count must be >= 0, or -1 for no limit"), e
         return
     except OverflowError as e:
         assert first > 2**31 - 1000 and "does not fit in 32 bits" in str(e), e

@@ -10,6 +10,7 @@
 
 #include "core/token_ids.h"
 #include "tokenizer/operator_table.h"
+#include "tokenizer/string_prefixes.h"
 #include "tokenizer/token_queries.h"
 #include "tokenizer/token_start.h"
 #include "tokenizer/token_text.h"
@@ -58,6 +59,16 @@ const StatementWord* FindStatementWord(const TokenText& text) {
 
 bool IsSkippedLeader(const TokenText& text) { return text.Is("\\") || text.Is("async"); }
 
+// Returns the index of the "import" or "from" that a key token "lazy" stands before, past any
+// line continuations, or `key` when it stands before neither: then "lazy" is a name.
+int KeyAfterLazy(PyObject* const* tokens, int key, int count) {
+  int next = key + 1;
+  while (next < count && TokenText(tokens[next]).Is("\\")) next++;
+  if (next == count) return key;
+  const TokenText text(tokens[next]);
+  return text.Is("import") || text.Is("from") ? next : key;
+}
+
 // Finds the defined name after the key token of a class or function definition; a line with
 // no name before its parameter list, base list or colon is no definition.
 int ScanDefinedName(PyObject* const* tokens, int key, int count, LineType* type,
@@ -81,7 +92,7 @@ int ScanDefinedName(PyObject* const* tokens, int key, int count, LineType* type,
 enum class Lead : uint8_t {
   kOther,
   kQuote,      // a string literal
-  kPrefix,     // R, U, r, u: a string literal when a quote follows
+  kPrefix,     // the letter of a plain str prefix (r, u): a string literal when a quote follows
   kEquals,     // "=" alone is an assignment at depth 0
   kBackslash,  // "\\" alone is a continuation, passed over
 };
@@ -90,7 +101,9 @@ struct LeadTable {
   Lead fRows[256];
   constexpr LeadTable() : fRows() {
     for (unsigned char quote : {'"', '\''}) fRows[quote] = Lead::kQuote;
-    for (unsigned char prefix : {'R', 'U', 'r', 'u'}) fRows[prefix] = Lead::kPrefix;
+    for (unsigned b = 0; b < 256; b++) {
+      if (kPlainStringLetters.Has(b)) fRows[b] = Lead::kPrefix;
+    }
     fRows[static_cast<unsigned char>('=')] = Lead::kEquals;
     fRows[static_cast<unsigned char>('\\')] = Lead::kBackslash;
   }
@@ -127,7 +140,7 @@ LineType ScanAssignmentOrStrings(PyObject* const* tokens, int count) {
 
 }  // namespace
 
-int ClassifyLogicalLine(PyObject* const* tokens, int count, LineType* type,
+int ClassifyLogicalLine(PyObject* const* tokens, int count, bool lazyImports, LineType* type,
                         PyObject** localScopeName) {
   int key = 0;
   while (key < count && IsSkippedLeader(TokenText(tokens[key]))) key++;
@@ -135,6 +148,7 @@ int ClassifyLogicalLine(PyObject* const* tokens, int count, LineType* type,
     *type = kBlankLine;
     return 0;
   }
+  if (lazyImports && TokenText(tokens[key]).Is("lazy")) key = KeyAfterLazy(tokens, key, count);
   const TokenText keyText(tokens[key]);
   if (const StatementWord* row = FindStatementWord(keyText)) {
     *type = row->fType;

@@ -94,7 +94,8 @@ PyObject* CreateNativeLogicalLine(PyTypeObject* lineType, const LineParts& parts
   line->fLineCount = parts.fLineCount;
   line->fStoredOffset = parts.fOffset;
   LineType type = kUnknown;
-  if (ClassifyLogicalLine(line->fTokenArray, line->fTokenCount, &type, &line->fLocalScopeName) != 0)
+  if (ClassifyLogicalLine(line->fTokenArray, line->fTokenCount, parts.fLazyImports, &type,
+                          &line->fLocalScopeName) != 0)
     return nullptr;
   line->fType = type;
   line->fFlags = FlagIf(parts.fSpacesInIndent, kSpacesInIndentFlag) |

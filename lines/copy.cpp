@@ -10,9 +10,13 @@
 
 #include "core/py_ref.h"
 #include "lines/construction.h"
+#include "lines/line_type.h"
 
 PyObject* CopyLogicalLine(LogicalLine* source) {
   const char* text = source->fLineText;
+  // Only a line read with lazy imports can be an import that begins with "lazy"; for any
+  // other line the reading changes nothing.
+  const bool lazyImports = source->fType == kImport || source->fType == kFromImport;
   const LineParts parts = {.fIndentLevel = source->fIndentLevel,
                            .fFirstLine = static_cast<int>(FirstLineOf(source)),
                            .fLineCount = source->fLineCount,
@@ -24,7 +28,8 @@ PyObject* CopyLogicalLine(LogicalLine* source) {
                            .fIncomplete = (source->fFlags & kIncompleteFlag) != 0,
                            .fLineText = text,
                            .fLineTextLength = text ? strlen(text) : 0,
-                           .fOffset = SourceOffsetOf(source)};
+                           .fOffset = SourceOffsetOf(source),
+                           .fLazyImports = lazyImports};
   PyRef copy = PyRef::Steal(CreateNativeLogicalLine(Py_TYPE(source), parts));
   if (!copy) return nullptr;
   LogicalLine* line = AsLine(copy.Get());

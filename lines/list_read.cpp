@@ -6,8 +6,10 @@
 
 #include "assembly/line_builder.h"
 #include "assembly/reading_state.h"
+#include "assembly/source_reader.h"
 #include "assembly/token_list.h"
 #include "core/py_ref.h"
+#include "core/text_buffer.h"
 #include "lines/construction.h"
 #include "lines/logical_line.h"
 #include "lines/numbering.h"
@@ -15,27 +17,45 @@
 
 namespace {
 
-// Reads logical lines into `list` until the stop line (-1: none), numbering them with `table`
-// when there is one. Returns 0, or -1.
+// Reads logical lines into `list` until the stop line (-1: none). While *table is set, the
+// lines are the module's own and are numbered with it. A readline may install a create hook
+// halfway through: the lines are then the host's objects, never numbered (one may be a line of
+// another list, whose numbering it keeps), and *table is cleared, so that the list is never
+// recorded and an update refuses it. Returns 0, or -1.
 int ReadLines(LineState* shared, ReadingState* state, int64_t stop, PyObject* list,
-              ShiftTable* table) {
+              ShiftTable** table) {
   while (!(stop != -1 && state->fLineNumber >= stop) && !state->fSource.fAtEnd) {
     LineParts parts;
     const int built = BuildLogicalLine(state, &parts);
     if (built < 0) return -1;
     if (built == 0) continue;
-    PyRef line = PyRef::Steal(CreateLogicalLine(shared, parts, true));
+    if (*table && HasCreateHook(shared)) *table = nullptr;
+    PyRef line = PyRef::Steal(*table ? CreateNativeLogicalLine(shared->fLineType, parts, true)
+                                     : CreateLogicalLine(shared, parts, true));
     GiveUpTokens(state);  // taken over by the call, whatever its outcome
     if (!line) return -1;
     if (line.Get() == Py_None) continue;
-    // A readline may install a create hook halfway through: its objects are not numbered, and
-    // an update refuses the list from then on, as it refuses every list while a hook is set.
-    if (table && IsLogicalLine(line.Get()) &&
-        NumberLine(table, AsLine(line.Get()), static_cast<size_t>(PyList_GET_SIZE(list))) != 0)
+    if (*table && NumberLine(*table, AsLine(line.Get()),
+                             static_cast<size_t>(PyList_GET_SIZE(list))) != 0)
       return -1;
     if (PyList_Append(list, line.Get()) != 0) return -1;
   }
   return 0;
+}
+
+// Records the list that a whole read numbered with `table`, with the text it was read from:
+// the buffer, or a copy of what readline handed out. Lines that readline cut otherwise than a
+// buffer is cut are numbered unlike a read of their text: their list is not recorded, and an
+// update refuses it. Returns 0, or -1 with an exception set.
+int SealRead(ShiftTable* table, PyObject* list, const ReadOptions& options,
+             const LineSource& source, const SourceLines& read, const TextBuffer& kept) {
+  if (source.fReadline && !KeptTextIsCutAtFeeds(&read)) return 0;
+  PyRef text = PyRef::Steal(
+      source.fReadline
+          ? PyBytes_FromStringAndSize(kept.fData, static_cast<Py_ssize_t>(kept.fLength))
+          : TextToKeep(source.fDataOwner, source.fData, source.fDataEnd));
+  if (!text) return -1;
+  return SealNumbering(table, list, text.Get(), options);
 }
 
 }  // namespace
@@ -56,18 +76,22 @@ PyObject* ReadLineList(LineState* shared, const ReadOptions& options, const Line
   // A whole read is numbered as it is built, so that the first update of the list need not
   // walk it; a window cannot be updated, and a hook's lines are not ours.
   ShiftTable* table = nullptr;
+  TextBuffer kept;
+  InitTextBuffer(&kept);
   if (source.fFirstLine == 0 && whole && !HasCreateHook(shared)) {
     table = NewShiftTable();
     if (!table) {
       ReleaseReadingState(&state);
       return PyErr_NoMemory();
     }
+    if (source.fReadline) KeepSourceText(&state.fSource, &kept);
   }
-  int status = ReadLines(shared, &state, stop, list.Get(), table);
+  ShiftTable* numbering = table;  // cleared when a hook takes over
+  int status = ReadLines(shared, &state, stop, list.Get(), &numbering);
+  if (status == 0 && numbering)
+    status = SealRead(numbering, list.Get(), options, source, state.fSource, kept);
   ReleaseReadingState(&state);
-  if (table) {
-    if (status == 0) status = SealNumbering(table, list.Get());
-    DropShiftTable(table);
-  }
+  ResetTextBuffer(&kept);
+  if (table) DropShiftTable(table);
   return status == 0 ? list.Release() : nullptr;
 }

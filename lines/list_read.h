@@ -1,6 +1,7 @@
 // Reading a whole source into a list of lines: one line per logical line that the builder
 // finds, made by construction (or the host's create hook). A full read of the module's own
-// lines is numbered as it is built, so that updates of the list need not walk it.
+// lines is numbered as it is built, so that updates of the list need not walk it, and its
+// record keeps the text and the options it was read with.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN
@@ -17,6 +18,7 @@ struct LineSource {
   PyObject* fReadline;  // the host's callable, or null to read [fData, fDataEnd)
   const char* fData;
   const char* fDataEnd;
+  PyObject* fDataOwner;  // the object whose buffer [fData, fDataEnd) is, or null
   int fFirstLine;
   int fLineCount;
 };

@@ -6,22 +6,27 @@
 // re-reading from the first line whose reading could have seen the edit, up to the first place
 // after the edit where the old read also started afresh, gives what a full read gives; every
 // other line keeps its object, and its annotations, with the lines after the edit moved by the
-// change in the line count.
+// change in the line count and in the byte count.
 //
 // Why the old lines can be trusted: all of the above holds of the lines as the last read or
 // update left them, numbered by their shared table. The table records the list and its items
 // then, and notes every line that leaves its numbering since (a line released, numbered for
 // another list, or given another range). An update goes on only with the very list, holding
-// the very lines, of that record; any other list is refused before anything changes. Every
-// check and allocation comes before the list changes, and no host code runs during the call,
-// so a refusal leaves the list exactly as it was.
+// the very lines, of that record, and with the options they were read with; any other list is
+// refused before anything changes.
+//
+// Why the edit can be trusted: the record keeps the text the lines were read from, and the
+// lines outside the edit that the host describes are compared with it byte for byte, before
+// anything changes. Only then are they what the old read made of those very lines. Every check
+// and allocation comes before the list changes, and no host code runs during the call, so a
+// refusal leaves the list exactly as it was.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
 #include "lines/list_update.h"
 
 #include <cstdint>
-#include <cstring>
+#include <string_view>
 
 #include "assembly/line_builder.h"
 #include "assembly/reading_state.h"
@@ -44,14 +49,10 @@ LogicalLine* LineAt(PyObject* lines, Py_ssize_t i) { return AsLine(PyList_GET_IT
 
 int64_t EndOf(const LogicalLine* line) { return FirstLineOf(line) + line->fLineCount; }
 
-// Moves p over `count` physical lines, cut as BytesIO.readline cuts them; stores in *passed
-// how many there were before the end.
-const char* SkipLines(const char* p, const char* end, int64_t count, int64_t* passed) {
-  for (*passed = 0; *passed < count && p < end; ++*passed) {
-    const auto* feed = static_cast<const char*>(memchr(p, '\n', static_cast<size_t>(end - p)));
-    p = feed ? feed + 1 : end;
-  }
-  return p;
+// The text a table records; empty for the new table of an empty list.
+std::string_view RecordedText(const ShiftTable* table) {
+  if (!table->fText) return {};
+  return {PyBytes_AS_STRING(table->fText), static_cast<size_t>(PyBytes_GET_SIZE(table->fText))};
 }
 
 // Returns the index of the first line that starts at or after physical line `number`.
@@ -69,6 +70,21 @@ Py_ssize_t FirstLineFrom(PyObject* lines, int64_t number) {
   return low;
 }
 
+// Returns the index of the first line that starts after byte `offset` of the text read.
+Py_ssize_t FirstLineAfter(PyObject* lines, int64_t offset) {
+  Py_ssize_t low = 0;
+  Py_ssize_t high = PyList_GET_SIZE(lines);
+  while (low < high) {
+    const Py_ssize_t middle = low + (high - low) / 2;
+    if (SourceOffsetOf(LineAt(lines, middle)) <= offset) {
+      low = middle + 1;
+    } else {
+      high = middle;
+    }
+  }
+  return low;
+}
+
 // Whether reading the new text from physical line `number` goes on as the old read did from
 // line `old`: the old read started afresh there (no line runs over it), and neither or both are
 // the first line, where a byte-order mark is skipped.
@@ -78,20 +94,89 @@ bool ReadsOnAsBefore(PyObject* lines, int64_t number, int64_t old) {
   return next == 0 || EndOf(LineAt(lines, next - 1)) <= old;
 }
 
-int RefuseLines() {
-  PyErr_SetString(PyExc_ValueError, "lines do not fit the text before the edit");
+int Refuse(const char* why) {
+  PyErr_SetString(PyExc_ValueError, why);
   return -1;
 }
 
-int RefuseChangedList() {
-  PyErr_SetString(PyExc_ValueError,
-                  "the list was changed since it was read or last updated; read it again");
-  return -1;
+constexpr char kChangedList[] =
+    "the list was changed since it was read or last updated; read it again";
+constexpr char kOtherOptions[] =
+    "the list was read with other options than this parser's; update it with a parser made "
+    "with the same options";
+constexpr char kOutsideText[] = "the edit lies outside the text";
+constexpr char kWrongEdit[] =
+    "the edit does not describe the change: outside the lines it names, the new text is not "
+    "the old one";
+
+// The record of a list that is not empty: the table that its first item shares, if any.
+ShiftTable* RecordOf(PyObject* lines) {
+  PyObject* first = PyList_GET_ITEM(lines, 0);
+  return IsLogicalLine(first) ? AsLine(first)->fShiftTable : nullptr;
 }
 
-// Numbers the list's lines afresh in a new table, regrouped in order. Returns the table, with
-// the caller's hold, or nullptr with MemoryError set and the lines as they were.
-ShiftTable* Regroup(PyObject* lines) {
+// Refuses a list that is not exactly as the last read or update left it, or that was read with
+// other options. Returns 0, or -1 with ValueError set.
+int CheckRecord(const ShiftTable* table, PyObject* lines, const ReadOptions& options) {
+  // Nothing short of reading the text again would prove that a changed list still fits it.
+  if (!table || !ListIsAsNumbered(table, lines)) return Refuse(kChangedList);
+  if (!(table->fOptions == options)) return Refuse(kOtherOptions);
+  return 0;
+}
+
+// Where physical line `number` of the text read starts: from the nearest line at or before it,
+// whose offset the read recorded, over the lines in between. *whole, unless null, tells whether
+// the text has that many lines.
+size_t OldLineStart(PyObject* lines, std::string_view old, int64_t number, bool* whole) {
+  const Py_ssize_t next = FirstLineFrom(lines, number + 1);
+  const LogicalLine* known = next > 0 ? LineAt(lines, next - 1) : nullptr;
+  const char* from = old.data() + (known ? SourceOffsetOf(known) : 0);
+  const int64_t count = number - (known ? FirstLineOf(known) : 0);
+  int64_t passed = 0;
+  const char* at = SkipLines(from, old.data() + old.size(), count, &passed);
+  if (whole) *whole = passed == count;
+  return static_cast<size_t>(at - old.data());
+}
+
+// The number of the physical line of the text read that starts at byte `offset`.
+int64_t OldLineNumber(PyObject* lines, std::string_view old, size_t offset) {
+  const Py_ssize_t next = FirstLineAfter(lines, static_cast<int64_t>(offset));
+  const LogicalLine* known = next > 0 ? LineAt(lines, next - 1) : nullptr;
+  const size_t from = known ? static_cast<size_t>(SourceOffsetOf(known)) : 0;
+  return (known ? FirstLineOf(known) : 0) + CountLines(old.substr(from, offset - from));
+}
+
+// The edit from the old text, that `lines` were read from, to the new one: the told edit once
+// it is proved true, or the narrowest true one. Returns 0 with *edit set, or -1 with ValueError.
+int EditOf(PyObject* lines, std::string_view old, std::string_view next, const Edit* told,
+           Edit* edit) {
+  if (!told) {
+    const ChangedBytes change = FindChange(old, next);
+    *edit = Edit{
+        .fFirst = OldLineNumber(lines, old, change.fStart),
+        .fOldCount = CountLines(old.substr(change.fStart, change.fOldEnd - change.fStart)),
+        .fNewCount = CountLines(next.substr(change.fStart, change.fNewEnd - change.fStart))};
+    return 0;
+  }
+  bool whole = false;
+  const size_t start = OldLineStart(lines, old, told->fFirst, &whole);
+  int64_t passed = 0;
+  const char* end =
+      SkipLines(old.data() + start, old.data() + old.size(), told->fOldCount, &passed);
+  if (!whole || passed < told->fOldCount) return Refuse(kOutsideText);
+  if (!KeepsAllBut(old, next, start, static_cast<size_t>(end - old.data()), told->fNewCount))
+    return Refuse(kWrongEdit);
+  *edit = *told;
+  return 0;
+}
+
+// Numbers the list's lines afresh in a new table, regrouped in order, with the record of the
+// old one. Returns the table, with the caller's hold, or nullptr with MemoryError set and the
+// lines as they were.
+ShiftTable* Regroup(PyObject* lines, const ShiftTable* old) {
+  // Taken before the lines leave the old table, which the last of them frees.
+  PyRef text = PyRef::FromBorrowed(old->fText);
+  const ReadOptions options = old->fOptions;
   const auto size = static_cast<size_t>(PyList_GET_SIZE(lines));
   ShiftTable* table = NewShiftTable();
   // Every allocation first: a failure then leaves the lines in the numbering they share.
@@ -103,45 +188,18 @@ ShiftTable* Regroup(PyObject* lines) {
   }
   for (size_t i = 0; i < size; i++)
     NumberLine(table, AsLine(PyList_GET_ITEM(lines, i)), i);  // cannot fail: room is reserved
-  SealNumbering(table, lines);  // cannot fail either
+  SealNumbering(table, lines, text.Get(), options);           // cannot fail either
   return table;
 }
 
-// The table that numbers a list that is not empty, with a hold for the caller: the one its
-// lines share, while the list holds exactly what the last read or update left in it; regrouped
+// The table to renumber a recorded list with, with a hold for the caller: its own, or a new one
 // when edits have split its groups so finely that moving them would cost more than numbering
-// them again. A list changed since is refused: nothing short of reading the text again would
-// prove that its lines still fit it. Returns nullptr with an exception set.
-ShiftTable* TableFor(PyObject* lines) {
-  const Py_ssize_t size = PyList_GET_SIZE(lines);
-  PyObject* first = PyList_GET_ITEM(lines, 0);
-  ShiftTable* table = IsLogicalLine(first) ? AsLine(first)->fShiftTable : nullptr;
-  if (!table || !ListIsAsNumbered(table, lines)) {
-    RefuseChangedList();
-    return nullptr;
-  }
-  if (table->fCount > 2 * (static_cast<size_t>(size) / kGroupLines) + 64) return Regroup(lines);
+// the lines again. Returns nullptr with MemoryError set.
+ShiftTable* TableToRenumber(PyObject* lines, ShiftTable* table) {
+  const auto size = static_cast<size_t>(PyList_GET_SIZE(lines));
+  if (table->fCount > 2 * (size / kGroupLines) + 64) return Regroup(lines, table);
   HoldShiftTable(table);
   return table;
-}
-
-// Where physical line `number` starts, when the text up to it is as the lines were read: from
-// the nearest line at or before it, whose offset the read recorded, over the lines in between.
-// Returns nullptr with ValueError set when the lines were not read from this text; *whole
-// tells whether the text has that many lines.
-const char* PhysicalLineStart(PyObject* lines, const char* data, const char* end, int64_t number,
-                              bool* whole) {
-  const Py_ssize_t next = FirstLineFrom(lines, number + 1);
-  const LogicalLine* known = next > 0 ? LineAt(lines, next - 1) : nullptr;
-  if (known && SourceOffsetOf(known) > end - data) {
-    RefuseLines();
-    return nullptr;
-  }
-  const int64_t count = number - (known ? FirstLineOf(known) : 0);
-  int64_t passed = 0;
-  const char* at = SkipLines(known ? data + SourceOffsetOf(known) : data, end, count, &passed);
-  *whole = passed == count;
-  return at;
 }
 
 // Where the re-read starts: the first line whose reading could have seen the edited lines.
@@ -155,14 +213,14 @@ int64_t ReReadStart(PyObject* lines, const Edit& edit) {
   return seen > edit.fFirst ? FirstLineOf(before) : edit.fFirst;
 }
 
-// Reads the new text from physical line `start` until the reader starts afresh after the edit
-// at a place where the old read also did, or the text ends. Appends the lines read to `added`
-// and stores the new number of the line where reading stopped. Returns 0, or -1.
+// Reads the new text from physical line `start`, at byte `from`, until the reader starts afresh
+// after the edit at a place where the old read also did, or the text ends. Appends the lines
+// read to `added` and stores the new number of the line where reading stopped. Returns 0, or -1.
 int ReRead(const LineState* shared, const ReadOptions& options, PyObject* lines, const Edit& edit,
-           const char* data, const char* from, const char* dataEnd, int64_t start,
-           PyObject* added, int64_t* stop, int64_t* stopOffset) {
+           std::string_view next, size_t from, int64_t start, PyObject* added, int64_t* stop) {
   ReadingState state;
-  InitBufferReading(&state, options, data, from, dataEnd, start, false);
+  InitBufferReading(&state, options, next.data(), next.data() + from, next.data() + next.size(),
+                    start, false);
   int status = 0;
   const int64_t editEnd = edit.fFirst + edit.fNewCount;
   while (!state.fSource.fAtEnd && status == 0) {
@@ -180,7 +238,6 @@ int ReRead(const LineState* shared, const ReadOptions& options, PyObject* lines,
     if (!line || PyList_Append(added, line.Get()) != 0) status = -1;
   }
   *stop = state.fSource.fAtEnd ? INT64_MAX : state.fLineNumber;
-  *stopOffset = NextLineOffset(&state.fSource);
   ReleaseReadingState(&state);
   return status;
 }
@@ -196,47 +253,55 @@ void GroupNewLines(PyObject* lines, ShiftTable* table, Py_ssize_t from, Py_ssize
   }
 }
 
-// After the list's slice from `index` took the `added` new lines, which are not numbered yet:
-// numbers them, and moves every later line by the edit. The new lines join the group of the
-// line before them, or groups of their own; the later lines of that group move one by one (to
-// a group of their own when the new lines did not join), and every later group as a whole.
-// Cannot fail: the table has room for ReservedGroups(added) more groups.
-void Renumber(PyObject* lines, ShiftTable* table, Py_ssize_t index, Py_ssize_t added,
-              int64_t lineDelta, int64_t byteDelta) {
+// Moves the lines from index `after` on by the edit. Every group after the edit moves as a
+// whole. A group that the edit falls inside has its later members moved one by one; unless
+// the new lines join that group, those members go to a group of their own just after it.
+void MoveLaterLines(PyObject* lines, ShiftTable* table, const LogicalLine* before,
+                    Py_ssize_t after, bool join, int64_t lineDelta, int64_t byteDelta) {
   const Py_ssize_t size = PyList_GET_SIZE(lines);
-  const Py_ssize_t after = index + added;
-  LogicalLine* before = index > 0 ? LineAt(lines, index - 1) : nullptr;
-  LogicalLine* next = after < size ? LineAt(lines, after) : nullptr;
-  const bool join = before && table->fGroups[before->fGroup].fMembers +
-                                      static_cast<size_t>(added) <= kGroupLimit;
-  size_t moveFrom = table->fCount;  // the first group that moves as a whole
-  if (next) {
-    const uint32_t group = next->fGroup;
-    moveFrom = table->fGroups[group].fPosition;
-    if (before && before->fGroup == group) {  // the group holds lines on both sides
-      const uint32_t target = join ? group : InsertGroup(table, moveFrom + 1);
-      for (Py_ssize_t i = after; i < size; i++) {
-        LogicalLine* line = LineAt(lines, i);
-        if (line->fGroup != group) break;
-        MoveLine(line, lineDelta, byteDelta);
-        if (!join) {
-          DetachLine(line);
-          AttachLine(line, table, target);
-        }
-      }
-      moveFrom = table->fGroups[target].fPosition + 1;
+  if (after == size) return;  // the edit ends the list: nothing moves
+  const uint32_t group = LineAt(lines, after)->fGroup;
+  const size_t position = table->fGroups[group].fPosition;
+  if (!before || before->fGroup != group) {  // the edit falls between two groups
+    ShiftGroupsFrom(table, position, lineDelta, byteDelta);
+    return;
+  }
+  const uint32_t target = join ? group : InsertGroup(table, position + 1);
+  for (Py_ssize_t i = after; i < size && LineAt(lines, i)->fGroup == group; i++) {
+    LogicalLine* line = LineAt(lines, i);
+    MoveLine(line, lineDelta, byteDelta);
+    if (!join) {
+      DetachLine(line);
+      AttachLine(line, table, target);
     }
   }
-  ShiftGroupsFrom(table, moveFrom, lineDelta, byteDelta);
+  ShiftGroupsFrom(table, table->fGroups[target].fPosition + 1, lineDelta, byteDelta);
+}
+
+// Numbers the `added` new lines from index `index`: in the group of the line before them when
+// they join it, else in groups of their own just after it, or first in the order.
+void NumberNewLines(PyObject* lines, ShiftTable* table, Py_ssize_t index, Py_ssize_t added,
+                    const LogicalLine* before, bool join) {
   if (join) {
-    for (Py_ssize_t i = index; i < after; i++)
-      AttachLine(AsLine(PyList_GET_ITEM(lines, i)), table, before->fGroup);
-  } else {
-    const size_t position = before ? table->fGroups[before->fGroup].fPosition + 1
-                            : next ? table->fGroups[next->fGroup].fPosition
-                                   : table->fCount;
-    GroupNewLines(lines, table, index, added, position);
+    for (Py_ssize_t i = index; i < index + added; i++)
+      AttachLine(LineAt(lines, i), table, before->fGroup);
+    return;
   }
+  GroupNewLines(lines, table, index, added,
+                before ? table->fGroups[before->fGroup].fPosition + 1 : 0);
+}
+
+// After the list's slice from `index` took the `added` new lines, which are not numbered yet:
+// moves every later line by the edit, and numbers the new lines. They join the group of the
+// line before them while it stays small. Cannot fail: the table has room for
+// ReservedGroups(added) more groups.
+void Renumber(PyObject* lines, ShiftTable* table, Py_ssize_t index, Py_ssize_t added,
+              int64_t lineDelta, int64_t byteDelta) {
+  const LogicalLine* before = index > 0 ? LineAt(lines, index - 1) : nullptr;
+  const bool join = before && table->fGroups[before->fGroup].fMembers +
+                                      static_cast<size_t>(added) <= kGroupLimit;
+  MoveLaterLines(lines, table, before, index + added, join, lineDelta, byteDelta);
+  NumberNewLines(lines, table, index, added, before, join);
 }
 
 // The groups that Renumber may make for `added` new lines.
@@ -244,45 +309,34 @@ size_t ReservedGroups(Py_ssize_t added) {
   return 1 + (static_cast<size_t>(added) + kGroupLines - 1) / kGroupLines;
 }
 
-// Updates `lines`, numbered by `table`, for the edit, from the new text [data, end). Returns
-// the result, or nullptr with an exception set and `lines` unchanged.
+// Updates `lines`, numbered by `table`, for the edit, proved true, to the new text [data, end)
+// that `owner` holds. Returns the result, or nullptr with an exception set and `lines`
+// unchanged.
 PyObject* UpdateNumbered(const LineState* shared, const ReadOptions& options, PyObject* lines,
-                         ShiftTable* table, const Edit& edit, const char* data, const char* end) {
+                         ShiftTable* table, const Edit& edit, const char* data, const char* end,
+                         PyObject* owner) {
+  const std::string_view old = RecordedText(table);
+  const std::string_view next(data, static_cast<size_t>(end - data));
   const int64_t start = ReReadStart(lines, edit);
-  bool whole = true;
-  const char* from = PhysicalLineStart(lines, data, end, start, &whole);
-  if (!from) return nullptr;
-  int64_t passed = 0;  // the new lines must be in the text: count them, and no further
-  SkipLines(from, end, edit.fFirst + edit.fNewCount - start, &passed);
-  if (!whole || passed < edit.fFirst + edit.fNewCount - start) {
-    PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
-    return nullptr;
-  }
+  // The re-read starts before the edit, where the new text is the old one.
+  const size_t from = OldLineStart(lines, old, start, nullptr);
   PyRef added = PyRef::Steal(PyList_New(0));
   int64_t stop = 0;
-  int64_t stopOffset = 0;
-  if (!added || ReRead(shared, options, lines, edit, data, from, end, start, added.Get(), &stop,
-                      &stopOffset) != 0)
+  if (!added ||
+      ReRead(shared, options, lines, edit, next, from, start, added.Get(), &stop) != 0)
     return nullptr;
   // Old lines from the start up to where the re-read stopped, in the old numbering, go. The
-  // ones after it keep their text, moved by the bytes and the lines that the edit changed.
+  // ones after it are in the text after the edit, kept byte for byte: they move by the lines
+  // and the bytes that the edit added.
   const Py_ssize_t size = PyList_GET_SIZE(lines);
   const Py_ssize_t index = FirstLineFrom(lines, start);
   const Py_ssize_t kept = stop == INT64_MAX ? size : FirstLineFrom(lines, stop - edit.Delta());
-  int64_t byteDelta = 0;
-  if (kept < size) {
-    const LogicalLine* next = LineAt(lines, kept);
-    const char* at = SkipLines(data + stopOffset, end, FirstLineOf(next) + edit.Delta() - stop,
-                               &passed);
-    byteDelta = (at - data) - SourceOffsetOf(next);
-    if (SourceOffsetOf(LineAt(lines, size - 1)) + byteDelta >= end - data) {  // past the text
-      RefuseLines();
-      return nullptr;
-    }
-  }
+  const int64_t byteDelta = static_cast<int64_t>(next.size()) - static_cast<int64_t>(old.size());
   const Py_ssize_t count = PyList_GET_SIZE(added.Get());
   PyRef result = PyRef::Steal(Py_BuildValue("nnO", index, kept - index, added.Get()));
   if (!result) return nullptr;
+  PyRef text = PyRef::Steal(TextToKeep(owner, data, end));
+  if (!text) return nullptr;
   if (ReserveGroups(table, ReservedGroups(count)) != 0 ||
       ReserveItems(table, static_cast<size_t>(size - (kept - index) + count)) != 0)
     return PyErr_NoMemory();
@@ -293,34 +347,42 @@ PyObject* UpdateNumbered(const LineState* shared, const ReadOptions& options, Py
   for (Py_ssize_t i = 0; i < kept - index; i++) DetachLine(LineAt(removed.Get(), i));
   Renumber(lines, table, index, count, edit.Delta(), byteDelta);
   SealReplacedLines(table, lines, static_cast<size_t>(index), static_cast<size_t>(kept - index),
-                    static_cast<size_t>(count));
+                    static_cast<size_t>(count), text.Get(), options);
   return result.Release();
 }
 
-}  // namespace
-
-PyObject* UpdateLineList(const LineState* shared, const ReadOptions& options, PyObject* lines,
-                         const Edit& edit, const char* data, const char* end) {
-  if (PyList_GET_SIZE(lines) > 0) {
-    ShiftTable* table = TableFor(lines);
-    if (!table) return nullptr;
-    PyObject* result = UpdateNumbered(shared, options, lines, table, edit, data, end);
-    DropShiftTable(table);
-    return result;
-  }
-  // An empty list proves nothing about the text it came from: the new text is read in full, as
-  // an edit of all of it, into a new numbering.
-  int64_t total = 0;
-  SkipLines(data, end, INT64_MAX, &total);
-  if (edit.fFirst + edit.fNewCount > total) {
-    PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
+// An empty list proves nothing about the text it came from: the new text is read in full, as
+// an edit of all of it, into a new numbering.
+PyObject* ReadIntoEmpty(const LineState* shared, const ReadOptions& options, PyObject* lines,
+                        const Edit* told, const char* data, const char* end, PyObject* owner) {
+  const int64_t total = CountLines(std::string_view(data, static_cast<size_t>(end - data)));
+  if (told && told->fFirst + told->fNewCount > total) {
+    Refuse(kOutsideText);
     return nullptr;
   }
   ShiftTable* table = NewShiftTable();
   if (!table) return PyErr_NoMemory();
   const Edit whole{.fFirst = 0, .fOldCount = 0, .fNewCount = total};
-  PyObject* result = UpdateNumbered(shared, options, lines, table, whole, data, end);
+  PyObject* result = UpdateNumbered(shared, options, lines, table, whole, data, end, owner);
   DropShiftTable(table);
   return result;
 }
 
+}  // namespace
+
+PyObject* UpdateLineList(const LineState* shared, const ReadOptions& options, PyObject* lines,
+                         const Edit* told, const char* data, const char* end, PyObject* owner) {
+  if (PyList_GET_SIZE(lines) == 0)
+    return ReadIntoEmpty(shared, options, lines, told, data, end, owner);
+  ShiftTable* recorded = RecordOf(lines);
+  if (CheckRecord(recorded, lines, options) != 0) return nullptr;
+  Edit edit{};
+  if (EditOf(lines, RecordedText(recorded),
+             std::string_view(data, static_cast<size_t>(end - data)), told, &edit) != 0)
+    return nullptr;
+  ShiftTable* table = TableToRenumber(lines, recorded);
+  if (!table) return nullptr;
+  PyObject* result = UpdateNumbered(shared, options, lines, table, edit, data, end, owner);
+  DropShiftTable(table);
+  return result;
+}

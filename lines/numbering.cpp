@@ -25,19 +25,29 @@ int NumberLine(ShiftTable* table, LogicalLine* line, size_t index) {
   return 0;
 }
 
-int SealNumbering(ShiftTable* table, PyObject* list) {
+PyObject* TextToKeep(PyObject* owner, const char* data, const char* end) {
+  const Py_ssize_t length = end - data;
+  if (owner && PyBytes_CheckExact(owner) && PyBytes_AS_STRING(owner) == data &&
+      PyBytes_GET_SIZE(owner) == length)
+    return Py_NewRef(owner);
+  return PyBytes_FromStringAndSize(data, length);
+}
+
+int SealNumbering(ShiftTable* table, PyObject* list, PyObject* text, const ReadOptions& options) {
   const auto count = static_cast<size_t>(PyList_GET_SIZE(list));
   if (ReserveItems(table, count) != 0) {
     PyErr_NoMemory();
     return -1;
   }
   RecordItems(table, list, 0, table->fItemCount, ItemsOf(list), count);
+  RecordText(table, text, options);
   return 0;
 }
 
 void SealReplacedLines(ShiftTable* table, PyObject* list, size_t index, size_t removed,
-                       size_t added) {
+                       size_t added, PyObject* text, const ReadOptions& options) {
   RecordItems(table, list, index, removed, ItemsOf(list) + index, added);
+  RecordText(table, text, options);
 }
 
 bool ListIsAsNumbered(const ShiftTable* table, PyObject* list) {

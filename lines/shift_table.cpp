@@ -1,4 +1,7 @@
-// The shared numbering table of an updated list.
+// The shared numbering table of an updated list, and its record of the list.
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
+
 #include "lines/shift_table.h"
 
 #include <cstdlib>
@@ -11,7 +14,8 @@ ShiftTable* NewShiftTable() {
   if (!table) return nullptr;
   *table = ShiftTable{.fRefs = 1, .fGroups = nullptr, .fOrder = nullptr, .fCount = 0,
                       .fGroupCapacity = 0, .fOrderCapacity = 0, .fList = nullptr,
-                      .fItems = nullptr, .fItemCount = 0, .fItemCapacity = 0, .fStale = false};
+                      .fItems = nullptr, .fItemCount = 0, .fItemCapacity = 0, .fStale = false,
+                      .fText = nullptr, .fOptions = {}};
   return table;
 }
 
@@ -22,6 +26,7 @@ void DropShiftTable(ShiftTable* table) {
   free(table->fGroups);
   free(table->fOrder);
   free(table->fItems);
+  Py_XDECREF(table->fText);
   free(table);
 }
 
@@ -66,6 +71,13 @@ void RecordItems(ShiftTable* table, const void* list, size_t index, size_t remov
   if (added) memcpy(at, items, added * sizeof(*at));
   table->fItemCount += added - removed;
   table->fStale = false;
+}
+
+void RecordText(ShiftTable* table, PyObject* text, const ReadOptions& options) {
+  PyObject* old = table->fText;
+  table->fText = Py_NewRef(text);
+  table->fOptions = options;
+  Py_XDECREF(old);  // a bytes object: its release runs no code of the host's
 }
 
 bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,

@@ -3,10 +3,16 @@
 // neighbours, all sharing one table: a line stores its first line and offset as they were when
 // it joined its group, and the table stores how far each group has moved since. Moving the
 // lines after an edit is then one pass over the groups that follow it, in one small array.
+// The table is also the record of the list it numbers: its items, its text and its options.
 #pragma once
+
+#define PY_SSIZE_T_CLEAN
+#include <Python.h>
 
 #include <cstddef>
 #include <cstdint>
+
+#include "assembly/line_parts.h"
 
 struct ShiftGroup {
   int64_t fLineShift;  // added to the first line that each member stores
@@ -33,6 +39,11 @@ struct ShiftTable {
   size_t fItemCount;
   size_t fItemCapacity;
   bool fStale;
+  // What the list was read from, so that an update can prove the host's description of an
+  // edit and read the new text as the list was read: the whole text as a bytes object (owned),
+  // null until the list is recorded; and the reading options.
+  PyObject* fText;
+  ReadOptions fOptions;
 };
 
 // A new empty table with one hold, or nullptr when memory is short (no exception set).
@@ -40,7 +51,7 @@ ShiftTable* NewShiftTable();
 
 void HoldShiftTable(ShiftTable* table);
 
-// Drops a hold, freeing the table with the last.
+// Drops a hold, freeing the table, and releasing its text, with the last.
 void DropShiftTable(ShiftTable* table);
 
 // Makes room for `more` groups, so that InsertGroup cannot fail. Returns 0, or -1 when memory
@@ -63,6 +74,10 @@ int ReserveItems(ShiftTable* table, size_t count);
 // removed all. Room must have been reserved.
 void RecordItems(ShiftTable* table, const void* list, size_t index, size_t removed,
                  const void* const* items, size_t added);
+
+// Records the text the list now stands for, a bytes object that the table takes a reference to,
+// and the options it was read with.
+void RecordText(ShiftTable* table, PyObject* text, const ReadOptions& options);
 
 // True when the list and its items are those recorded and no line has left the numbering since.
 bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,

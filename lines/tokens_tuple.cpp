@@ -197,7 +197,7 @@ PyObject* PositionTuple(EntryTables* tables, TokenPosition position) {
   return made;
 }
 
-PyObject* LineTokens(EntryTables* tables, const TokenTexts* texts, LogicalLine* line) {
+PyObject* TokensTupleOf(EntryTables* tables, const TokenTexts* texts, LogicalLine* line) {
   if (!line->fTokensTuple) {
     PyObject* built = BuildTokensTuple(tables, texts, line);
     if (!built) return nullptr;

@@ -20,7 +20,7 @@ PyObject* PositionTuple(EntryTables* tables, TokenPosition position);
 
 // Returns the line's fTokens tuple, built at the first call and the same object after, from the
 // tables of the line's interpreter and the texts that its reads share.
-PyObject* LineTokens(EntryTables* tables, const TokenTexts* texts, LogicalLine* line);
+PyObject* TokensTupleOf(EntryTables* tables, const TokenTexts* texts, LogicalLine* line);
 
 // Empties the tables.
 void ReleaseEntryTables(EntryTables* tables);

@@ -6,6 +6,7 @@
 
 #include "core/py_ref.h"
 #include "core/token_ids.h"
+#include "module/parser.h"
 
 namespace {
 
@@ -91,6 +92,8 @@ int AddModuleConstants(PyObject* module, ModuleState* state) {
   if (PyDict_SetItemString(dict, "LogicalLineType", lineType) != 0) return -1;
   PyRef comment = PyRef::Steal(PyLong_FromLong(COMMENT_TOKEN));
   if (!comment || PyDict_SetItemString(dict, "COMMENT_TOKEN", comment.Get()) != 0) return -1;
+  PyRef newest = PyRef::Steal(NewestFeatureVersion());
+  if (!newest || PyDict_SetItemString(dict, "kNewestFeatureVersion", newest.Get()) != 0) return -1;
   // The build compiles in the version that the package metadata also carries.
   PyRef version = PyRef::Steal(PyUnicode_FromString(LOGICALLINE_VERSION));
   if (!version) return -1;

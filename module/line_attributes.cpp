@@ -72,7 +72,7 @@ PyObject* GetLocalScopeName(PyObject* self, void*) {
 }
 PyObject* GetTokens(PyObject* self, void*) {
   const LineState* shared = StateOfType(Py_TYPE(self))->fShared;
-  return LineTokens(shared->fEntries, shared->fTokenTexts, AsLine(self));
+  return TokensTupleOf(shared->fEntries, shared->fTokenTexts, AsLine(self));
 }
 PyObject* GetLineText(PyObject* self, void*) {
   const char* text = AsLine(self)->fLineText;

@@ -24,14 +24,18 @@ int StoreTruth(PyObject* option, int* field) {
   return 0;
 }
 
-// The first minor version of 3 that reads each way; earlier ones read as the classic rules do.
+// The first minor version of 3 that reads each way, newest first; earlier ones read as the
+// classic rules do, and later ones as the first row.
 constexpr struct {
   long fMinor;
   StringRules fRules;
-} kRulesByVersion[] = {
-    {14, StringRules::kTemplates},
-    {12, StringRules::kFormatted},
+  bool fLazyImports;
+} kReadingsByVersion[] = {
+    {15, StringRules::kTemplates, true},
+    {14, StringRules::kTemplates, false},
+    {12, StringRules::kFormatted, false},
 };
+static_assert(kReadingsByVersion[0].fRules == kNewestRules, "the newest version reads all");
 
 // Returns the minor version of a (3, minor) tuple of ints, or -1 with TypeError or ValueError.
 long MinorVersion(PyObject* version) {
@@ -53,16 +57,18 @@ long MinorVersion(PyObject* version) {
   return minor;
 }
 
-// Stores the string rules of a feature version; None, the default, reads as the classic rules
-// do. Returns -1 with an exception set when the version is refused.
-int StoreStringRules(PyObject* version, StringRules* field) {
-  *field = StringRules::kClassic;
+// Stores the reading of a feature version; None, the default, reads as the classic rules do.
+// Returns -1 with an exception set when the version is refused.
+int StoreReading(PyObject* version, LogicalLineParser* parser) {
+  parser->fStringRules = StringRules::kClassic;
+  parser->fLazyImports = 0;
   if (version == Py_None) return 0;
   const long minor = MinorVersion(version);
   if (minor < 0) return -1;
-  for (const auto& row : kRulesByVersion) {
+  for (const auto& row : kReadingsByVersion) {
     if (minor >= row.fMinor) {
-      *field = row.fRules;
+      parser->fStringRules = row.fRules;
+      parser->fLazyImports = row.fLazyImports;
       break;
     }
   }
@@ -106,7 +112,7 @@ PyObject* NewParser(ModuleState* state, PyObject* copyStrings, PyObject* skipWhi
       StoreTruth(removeComments, &parser->fRemoveComments) != 0 ||
       StoreTruth(copyStrings, &parser->fCopyStrings) != 0 ||
       StoreTruth(includeLineText, &parser->fIncludeLineText) != 0 ||
-      StoreStringRules(featureVersion, &parser->fStringRules) != 0) {
+      StoreReading(featureVersion, parser) != 0) {
     Py_DECREF(parser);
     return nullptr;
   }
@@ -121,5 +127,8 @@ ReadOptions ParserOptions(PyObject* self) {
                      .fSkipWhitespaceLines = parser->fSkipWhitespaceLines != 0,
                      .fRemoveComments = parser->fRemoveComments != 0,
                      .fIncludeLineText = parser->fIncludeLineText != 0,
-                     .fStringRules = parser->fStringRules};
+                     .fStringRules = parser->fStringRules,
+                     .fLazyImports = parser->fLazyImports != 0};
 }
+
+PyObject* NewestFeatureVersion() { return Py_BuildValue("(il)", 3, kReadingsByVersion[0].fMinor); }

@@ -19,6 +19,7 @@ struct LogicalLineParser {
   int fIncludeLineText;      // lines carry their source text
   StringRules fStringRules;  // the interpreter version whose strings the parser reads
   LineState* fShared;        // its module's, which lives while the parser holds its type
+  int fLazyImports;          // "lazy import" and "lazy from" begin imports
 };
 
 // Returns a new parser type for `module`, or nullptr with an exception set.
@@ -38,3 +39,7 @@ ReadOptions ParserOptions(PyObject* parser);
 inline LineState* ParserShared(PyObject* parser) {
   return reinterpret_cast<LogicalLineParser*>(parser)->fShared;
 }
+
+// Returns a new (3, minor) tuple of the newest interpreter version whose reading the parser
+// knows; every later version reads as it does. nullptr with an exception set on failure.
+PyObject* NewestFeatureVersion();

@@ -10,18 +10,23 @@
 
 namespace {
 
-// Reads the source through readline, or from [data, dataEnd) when readline is null. Returns a
-// new list, or nullptr with an exception set.
+// Reads the source through readline, or from [data, dataEnd), the buffer of `owner`, when
+// readline is null. Returns a new list, or nullptr with an exception set.
 PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const char* dataEnd,
-                     int firstLine, int lineCount) {
+                     PyObject* owner, int firstLine, int lineCount) {
   if (firstLine < 0) {  // refused before the host's stream moves
     PyErr_SetString(PyExc_ValueError, "first line must be >= 0");
+    return nullptr;
+  }
+  if (lineCount < -1) {  // -1 alone means no limit; refused before the stream moves too
+    PyErr_SetString(PyExc_ValueError, "line count must be >= 0, or -1 for no limit");
     return nullptr;
   }
   return ReadLineList(ParserShared(self), ParserOptions(self),
                       LineSource{.fReadline = readline,
                                  .fData = data,
                                  .fDataEnd = dataEnd,
+                                 .fDataOwner = owner,
                                  .fFirstLine = firstLine,
                                  .fLineCount = lineCount});
 }
@@ -43,7 +48,7 @@ PyObject* GetLogicalLineList(PyObject* self, PyObject* args) {
     PyErr_SetString(PyExc_TypeError, "readline arg must be a callable");
     return nullptr;
   }
-  return ReadSource(self, readline, nullptr, nullptr, firstLine, lineCount);
+  return ReadSource(self, readline, nullptr, nullptr, nullptr, firstLine, lineCount);
 }
 
 PyDoc_STRVAR(kGetLogicalLineListFromBufferDoc,
@@ -61,7 +66,8 @@ PyObject* GetLogicalLineListFromBuffer(PyObject* self, PyObject* args) {
                         &lineCount))
     return nullptr;
   const char* data = static_cast<const char*>(view.buf);
-  PyObject* list = ReadSource(self, nullptr, data, data + view.len, firstLine, lineCount);
+  PyObject* list =
+      ReadSource(self, nullptr, data, data + view.len, view.obj, firstLine, lineCount);
   PyBuffer_Release(&view);
   return list;
 }

@@ -28,28 +28,39 @@ struct CollectorPause {
 
 PyDoc_STRVAR(kUpdateLogicalLineListDoc,
              "Update a list of logical lines after an edit of the text it was read from.  "
-             "Arguments: the list (read by this parser from line 0, maybe updated before), the "
-             "whole new text as a bytes-like object, the first edited physical line (from 0), "
-             "the number of physical lines the edit replaced, and the number it put in their "
-             "place.  Only the lines the edit can affect are read again; every other line keeps "
-             "its object, and those after the edit move by the change in the line count.  The "
-             "list is changed in place; the result is (index, removed, added): from index on, "
-             "removed lines went and the list added took their place.  Raises ValueError, and "
-             "leaves the list as it was, for an edit outside the text or a list that is not "
-             "exactly as the read or the last update left it.");
+             "Arguments: the list (read by a parser with this one's options from line 0, maybe "
+             "updated before), the whole new text as a bytes-like object, and optionally the "
+             "edit: the first edited physical line (from 0), the number of physical lines the "
+             "edit replaced, and the number it put in their place.  Without the edit, the "
+             "changed lines are found by comparing the new text with the old one, which the "
+             "list's record keeps.  Only the lines the edit can affect are read again; every "
+             "other line keeps its object, and those after the edit move by the change in the "
+             "line count.  The list is changed in place; the result is (index, removed, added): "
+             "from index on, removed lines went and the list added took their place.  Raises "
+             "ValueError, and leaves the list as it was, for an edit that does not describe the "
+             "change from the old text to the new one, a list read with other options, or a "
+             "list that is not exactly as the read or the last update left it.");
 PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
   PyObject* lines = nullptr;
   Py_buffer view;
   int first = 0;
   int oldCount = 0;
   int newCount = 0;
-  if (!PyArg_ParseTuple(args, "O!y*iii:UpdateLogicalLineList", &PyList_Type, &lines, &view,
+  if (!PyArg_ParseTuple(args, "O!y*|iii:UpdateLogicalLineList", &PyList_Type, &lines, &view,
                         &first, &oldCount, &newCount))
     return nullptr;
   struct Release {
     Py_buffer* fView;
     ~Release() { PyBuffer_Release(fView); }
   } release{&view};
+  const Py_ssize_t given = PyTuple_GET_SIZE(args);
+  if (given != 2 && given != 5) {
+    PyErr_Format(PyExc_TypeError,
+                 "UpdateLogicalLineList() takes the list and the text, and then the edit's "
+                 "first line, old count and new count or none of them (%zd given)",
+                 given);
+    return nullptr;
+  }
   if (HasCreateHook(ParserShared(self))) {
     PyErr_SetString(PyExc_TypeError,
                     "UpdateLogicalLineList needs the module's own lines, and a create hook is "
@@ -60,11 +71,11 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
     PyErr_SetString(PyExc_ValueError, "the edit lies outside the text");
     return nullptr;
   }
+  const Edit told{.fFirst = first, .fOldCount = oldCount, .fNewCount = newCount};
   [[maybe_unused]] const CollectorPause pause;
   const char* data = static_cast<const char*>(view.buf);
   return UpdateLineList(ParserShared(self), ParserOptions(self), lines,
-                        Edit{.fFirst = first, .fOldCount = oldCount, .fNewCount = newCount}, data,
-                        data + view.len);
+                        given == 5 ? &told : nullptr, data, data + view.len, view.obj);
 }
 
 }  // namespace

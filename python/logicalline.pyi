@@ -7,7 +7,7 @@
 # CreateLogicalLineParser.
 
 from collections.abc import Callable
-from typing import Final, Protocol, final, type_check_only
+from typing import Final, Protocol, final, overload, type_check_only
 
 from typing_extensions import Buffer
 
@@ -50,6 +50,9 @@ kGenericAttribInfo: Final[tuple[str, None]]
 
 LogicalLineType: Final[type[LogicalLine]]
 COMMENT_TOKEN: Final[int]
+# The newest (major, minor) that feature_version reads as that version does; later ones read
+# as it does.
+kNewestFeatureVersion: Final[tuple[int, int]]
 # The release, as the package metadata gives it: "0.2.0".
 __version__: Final[str]
 
@@ -114,6 +117,7 @@ class LogicalLine:
 class LogicalLineParser:
     # readline returns one physical line of bytes per call and b"" at the end. With a create
     # hook installed the list holds whatever the hook returned instead of LogicalLine objects.
+    # line_count -1 reads to the end; a count below -1 raises ValueError.
     def GetLogicalLineList(
         self, readline: Callable[[], bytes], first_line: int = 0, line_count: int = -1, /
     ) -> list[LogicalLine]: ...
@@ -123,11 +127,18 @@ class LogicalLineParser:
         self, data: Buffer, first_line: int = 0, line_count: int = -1, /
     ) -> list[LogicalLine]: ...
     # After an edit that replaced old_count physical lines from first_line (0-based) with
-    # new_count lines, makes `lines` (a full read of the old text by this parser) what a full
-    # read of `data` gives, re-reading only what the edit touched. Returns (index, removed,
-    # added): lines[index:index + len(added)] is added, in place of `removed` old lines.
-    # Raises ValueError, leaving `lines` as it was, for an edit outside the text or a list
-    # that is not exactly as the read or the last update left it (read the text again then).
+    # new_count lines, makes `lines` (a full read of the old text by a parser with these
+    # options) what a full read of `data` gives, re-reading only what the edit touched; without
+    # the three counts the module finds the changed lines by comparing data with the old text.
+    # Returns (index, removed, added): lines[index:index + len(added)] is added, in place of
+    # `removed` old lines. Raises ValueError, leaving `lines` as it was, for an edit that does
+    # not describe the change from the old text, a list read with other options, or a list that
+    # is not exactly as the read or the last update left it (read the text again then).
+    @overload
+    def UpdateLogicalLineList(
+        self, lines: list[LogicalLine], data: Buffer, /
+    ) -> tuple[int, int, list[LogicalLine]]: ...
+    @overload
     def UpdateLogicalLineList(
         self, lines: list[LogicalLine], data: Buffer, first_line: int, old_count: int,
         new_count: int, /

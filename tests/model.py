@@ -68,13 +68,16 @@ def find_operator(b, p, end):  # the longest operator at p that lies wholly befo
     return next((b[p:p + n] for n in (3, 2, 1) if p + n <= end and b[p:p + n] in OPERATORS), None)
 
 
-def string_start(b, p, end):
-    """(position after the opening quotes, quote, triple), or None if no string starts at p."""
+def string_start(b, p, end, newest=False):
+    """(position after the opening quotes, quote, triple), or None if no string starts at p.
+    The newest reading drops the u and r pair, which Python 3 never had; t-strings it reads are
+    beyond the model."""
     l1, l2, l3 = (b[i] | 0x20 if i < end and 0x41 <= b[i] <= 0x5A else b[i] if i < end else 0
                   for i in (p, p + 1, p + 2))
+    pairs = (b"rb", b"rf", b"br", b"fr") + (() if newest else (b"ru", b"ur"))
     if l1 in b"rbuf" and l2 in QUOTES:
         p += 1
-    elif l3 in QUOTES and bytes((l1, l2)) in (b"rb", b"ru", b"rf", b"br", b"ur", b"fr"):
+    elif l3 in QUOTES and bytes((l1, l2)) in pairs:
         p += 2
     if p >= end or b[p] not in QUOTES:
         return None
@@ -83,9 +86,9 @@ def string_start(b, p, end):
     return p + (3 if triple else 1), q, triple
 
 
-def token_id_for_start(b, p=0, end=None):
+def token_id_for_start(b, p=0, end=None, newest=False):
     end = len(b) if end is None else end
-    if string_start(b, p, end):
+    if string_start(b, p, end, newest):
         return STRING
     op = find_operator(b, p, end) if p < end else None
     c = b[p] if p < end else None
@@ -128,7 +131,7 @@ def scan_number(b, p, end):
     return p
 
 
-def scan_next_token(b, st, pos, end):
+def scan_next_token(b, st, pos, end, newest=False):
     """Scans the token at pos into st; returns the position after it, or None at the end."""
     if pos >= end:
         return None
@@ -138,7 +141,7 @@ def scan_next_token(b, st, pos, end):
         pos = BLANKS.match(b, pos, end).end()
         if pos >= end:
             return None
-        st.tok, st.start, st.complete = token_id_for_start(b, pos, end), pos, 1
+        st.tok, st.start, st.complete = token_id_for_start(b, pos, end, newest), pos, 1
         if st.tok == NAME:
             pos = step_char(b, pos, end)
             while pos < end:
@@ -149,7 +152,7 @@ def scan_next_token(b, st, pos, end):
         elif st.tok == NUMBER:
             pos = scan_number(b, pos, end)
         elif st.tok == STRING:
-            pos, st.quote, st.triple = string_start(b, pos, end)
+            pos, st.quote, st.triple = string_start(b, pos, end, newest)
             pos = scan_string_body(b, st, pos, end)
         elif st.tok == NEWLINE:
             pos += 2 if b[pos:min(pos + 2, end)] == b"\r\n" else 1
@@ -172,8 +175,8 @@ def nesting_delta(text):
 class Builder:
     """Working state of one logical line: its text, scanner state and token list."""
 
-    def __init__(self, copy_strings, remove_comments):
-        self.copy_strings, self.remove_comments = copy_strings, remove_comments
+    def __init__(self, copy_strings, remove_comments, newest):
+        self.copy_strings, self.remove_comments, self.newest = copy_strings, remove_comments, newest
         self.text, self.line_starts, self.tokens, self.positions = b"", [], [], []
         # Scanner state; complete is 0 while a string runs on to the next physical line.
         self.scan = SimpleNamespace(tok=0, start=-1, end=-1, complete=0, quote=0, triple=0)
@@ -190,7 +193,7 @@ class Builder:
         self.line_starts.append(line_start)
         b = self.text = self.text + line
         st, pos = self.scan, line_start
-        while (pos := scan_next_token(b, st, pos, len(b))) is not None:
+        while (pos := scan_next_token(b, st, pos, len(b), self.newest)) is not None:
             if measure and self.indent < 0:  # measured at the first token, even if dropped
                 self.indent = 0
                 for c in b[line_start:st.start]:
@@ -237,6 +240,8 @@ class Builder:
                         or b"else" in toks[k + 1:] or b"for" in toks[:k])
         if t == b"else":
             return k < 50 and (k == 0 or b"if" not in toks[:k])
+        if self.newest and t == b"lazy":  # a lazy import
+            return toks[k + 1:k + 2] in ([b"import"], [b"from"])
         return t in STATEMENT_KEYWORDS
 
 
@@ -261,9 +266,9 @@ class Source:
 
 
 def build_logical_line(src, lineno, copy_strings, skip_whitespace_lines, remove_comments,
-                       include_line_text):
+                       include_line_text, newest):
     """Returns (line dict or None, the number of the next physical line)."""
-    bld, first = Builder(copy_strings, remove_comments), lineno
+    bld, first = Builder(copy_strings, remove_comments, newest), lineno
     line = src.read(lineno)
     if line:
         bld.add_line(line, measure=True)
@@ -291,7 +296,7 @@ def build_logical_line(src, lineno, copy_strings, skip_whitespace_lines, remove_
         return None, lineno
     if first > 2**31 - 1:  # line numbers are counted wide but stored in 32 bits
         raise OverflowError("Line number does not fit in 32 bits")
-    line_type, name = classify(bld.tokens)
+    line_type, name = classify(bld.tokens, newest)
     return dict(
         type=line_type, local_scope_name=name, first_line=first, line_count=lineno - first,
         indent=bld.indent, tabs=bld.tabs, spaces=bld.spaces, incomplete=int(is_open),
@@ -303,26 +308,33 @@ OPTIONS = ("copy_strings", "skip_whitespace_lines", "remove_comments", "include_
 
 
 def model_lines(physical_lines, copy_strings=True, skip_whitespace_lines=True,
-                remove_comments=True, include_line_text=True, first_line=0, line_count=-1):
-    """The logical lines of the source that readline hands out as physical_lines."""
+                remove_comments=True, include_line_text=True, first_line=0, line_count=-1,
+                newest=False):
+    """The logical lines of the source that readline hands out as physical_lines, read as by
+    default or, with `newest`, as the newest Python reads code without f-strings or t-strings."""
     if first_line < 0:
         raise ValueError("first line must be >= 0")
+    if line_count < -1:
+        raise ValueError("line count must be >= 0, or -1 for no limit")
     opts = (copy_strings, skip_whitespace_lines, remove_comments, include_line_text)
     stop = first_line + line_count  # never wraps: counted wider than the arguments
-    stop = None if line_count == -1 or stop == -1 else stop
+    stop = None if line_count == -1 else stop
     src, lineno, result = Source(physical_lines), first_line, []
     while (stop is None or lineno < stop) and not src.at_end:
-        line, lineno = build_logical_line(src, lineno, *map(bool, opts))
+        line, lineno = build_logical_line(src, lineno, *map(bool, opts), newest)
         if line is not None:
             result.append(line)
     return result
 
 
-def classify(tokens):
+def classify(tokens, newest=False):
     """(line type, defined name or None), from the token texts alone."""
     key = next((i for i, t in enumerate(tokens) if t not in (b"\\", b"async")), None)
     if key is None:
         return BLANK_LINE, None
+    after = [t for t in tokens[key + 1:] if t != b"\\"][:1]
+    if newest and tokens[key] == b"lazy" and after in ([b"import"], [b"from"]):
+        return LINE_KEYWORDS[after[0]], None  # a lazy import
     line_type = LINE_KEYWORDS.get(tokens[key])
     if line_type in (CLASS_DEF, FUNCTION_DEF):
         name = next((t for t in tokens[key + 1:] if t[:1] in (b"(", b")", b":") or

@@ -139,10 +139,12 @@ def test_help_fits_80_columns(capsys, monkeypatch):
 
 @pytest.mark.parametrize("window", [1, 2, 3, 5, 100])
 def test_windows_give_what_one_read_gives(window):
-    for skip in (True, False):
+    # A U+FEFF that opens the file is skipped, and one that opens a window is a token.
+    marked = b"\xef\xbb\xbf" + b"a = 1\n\xef\xbb\xbfb = 2\n" * 3
+    for skip, source in [(True, SPANNING), (False, SPANNING), (True, marked)]:
         parser = logicalline.CreateLogicalLineParser(skip_whitespace_lines=skip)
-        whole = parser.GetLogicalLineListFromBuffer(SPANNING, 1)
-        read = [line for lines, _ in reading.windows(parser, SPANNING, window) for line in lines]
+        whole = parser.GetLogicalLineListFromBuffer(source, 1)
+        read = [line for lines, _ in reading.windows(parser, source, window) for line in lines]
         assert [(x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in read] == [
             (x.fFirstLine, x.fLineCount, x.fType, x.fTokens, x.fIncomplete) for x in whole]
 

@@ -73,6 +73,18 @@ def readline():
 first, *rest = PARSER.GetLogicalLineList(readline)
 assert type(first) is logicalline.LogicalLineType and rest == [1, 2]
 assert outcome(PARSER.UpdateLogicalLineList, [first] + rest, b"x\n", 0, 1, 1) == "TypeError"
+''', "a hook installed by readline before the first line, returning anything": r'''
+other = PARSER.GetLogicalLineListFromBuffer(b"x = 1\ny = (2,\n 3)\n")
+results = iter(["host object", other[0], other[1], other[1], None, other[0]])
+source = iter([b"a = 1\n", b"b = 2\n", b"c = 3\n", b"d = 4\n", b"e = 5\n", b"f = 6\n", b""])
+def readline():
+    logicalline.SetLogicalCreateFunction(lambda *parts: next(results))
+    return next(source)
+read = PARSER.GetLogicalLineList(readline)  # numbers none of them, nor takes them from `other`
+assert read == ["host object", other[0], other[1], other[1], other[0]]
+assert read[1] is other[0] and read[2] is read[3] is other[1]
+assert [(x.fFirstLine, x.fLineCount) for x in other] == [(0, 1), (1, 2)]
+assert outcome(PARSER.UpdateLogicalLineList, read, b"x\n") == "TypeError"
 '''}
 
 

@@ -63,9 +63,12 @@ def module_view(line):
         line_text=text)
 
 
-def assert_agreement(chunks, opts, first_line=0, line_count=-1):
-    """Both entry points read as the model does; a buffer is cut where BytesIO.readline cuts."""
-    data, parser = b"".join(chunks), logicalline.CreateLogicalLineParser(*opts)
+def assert_agreement(chunks, opts, first_line=0, line_count=-1, newest=False):
+    """Both entry points read as the model does; a buffer is cut where BytesIO.readline cuts.
+    With `newest`, both read as the newest Python the module knows."""
+    version = logicalline.kNewestFeatureVersion if newest else None
+    data = b"".join(chunks)
+    parser = logicalline.CreateLogicalLineParser(*opts, feature_version=version)
     lines = io.BytesIO(data).readlines()
     for path, source, read in [
             # A readline call after the final b"" raises StopIteration, which would show here.
@@ -74,7 +77,8 @@ def assert_agreement(chunks, opts, first_line=0, line_count=-1):
             ("buffer", lines, lambda: parser.GetLogicalLineListFromBuffer(
                 data, first_line, line_count))]:
         want = outcome(lambda: [model_view(line) for line in
-                                model.model_lines(source, *opts, first_line, line_count)])
+                                model.model_lines(source, *opts, first_line, line_count,
+                                                  newest)])
         got = outcome(lambda: [module_view(line) for line in read()])
         if got == want:
             continue
@@ -115,9 +119,15 @@ FRAGMENTS = {
     b"\xef\xbb\xbf": 1}
 
 
-def hostile_chunks(seed, nul=False):
+# The same, but for what the newest Python reads otherwise: lazy imports, and a u and r pair
+# before a quote. No f begins a formatted string, which the model leaves to the module's tests.
+NEWEST_FRAGMENTS = {**{text: weight for text, weight in FRAGMENTS.items() if text != b"f"},
+                    b"lazy ": 2, b"lazy import ": 2, b"lazy from ": 2, b"ur'": 1, b'Ru"': 1}
+
+
+def hostile_chunks(seed, nul=False, fragments=FRAGMENTS):
     rng = random.Random(seed)
-    data = b"".join(rng.choices(list(FRAGMENTS), list(FRAGMENTS.values()), k=rng.randint(1, 60)))
+    data = b"".join(rng.choices(list(fragments), list(fragments.values()), k=rng.randint(1, 60)))
     data = (b"\xef\xbb\xbf" if rng.random() < 0.1 else b"") + data  # a byte-order mark
     if nul:
         at = rng.randrange(len(data) + 1)
@@ -134,12 +144,19 @@ def hostile_chunks(seed, nul=False):
 def test_hostile_inputs(block):
     for seed in range(block * 100, block * 100 + 100):
         rng = random.Random(-seed)
-        # A negative first line is refused; first line + count = -1 means no stop line; past
-        # the largest line number is refused, never wrapped.
+        # A negative first line is refused, and so is a count below -1; past the largest line
+        # number is refused, never wrapped.
         window = rng.choice([(0, -1)] * 6 + [(7, -1), (0, 0), (3, 1), (0, 2), (5, 4), (0, -5),
                                              (-1, -1), (1, -2), (2**31 - 2, 3)])
         for opts in rng.sample(ALL_OPTIONS, 3):
             assert_agreement(hostile_chunks(seed, nul=seed % 8 == 0), opts, *window)
+
+
+@pytest.mark.parametrize("block", range(3))
+def test_hostile_inputs_read_as_the_newest_python(block):
+    for seed in range(block * 100, block * 100 + 100):
+        for opts in random.Random(seed).sample(ALL_OPTIONS, 2):
+            assert_agreement(hostile_chunks(seed, fragments=NEWEST_FRAGMENTS), opts, newest=True)
 
 
 def run_isolated(code):

@@ -148,6 +148,8 @@ def test_deep_brackets_read_as_one_line():
     ((10, 2), [10, 11]),                      # the line that starts on 11 is still read whole
     ((0, 0), []), ((2**31 - 3, 3), [2**31 - 3, 2**31 - 2]),  # the stop line 2**31 does not wrap
     ((2**31 - 3, -1), "Line number does not fit in 32 bits"), ((-5, -1), "first line must be >= 0"),
+    ((1, -2), "line count must be >= 0, or -1 for no limit"),  # only -1 means no limit
+    ((0, -2), "line count must be >= 0, or -1 for no limit"),
 ])
 def test_reading_windows(window, result):
     try:
@@ -155,7 +157,7 @@ def test_reading_windows(window, result):
     except (OverflowError, ValueError) as error:
         result_seen = str(error)
     assert result_seen == result
-    if window[0] < 0:  # refused before readline is called
+    if window[0] < 0 or window[1] < -1:  # refused before readline is called
         pytest.raises(ValueError, logicalline.CreateLogicalLineParser().GetLogicalLineList,
                       lambda: pytest.fail("readline called"), *window)
 

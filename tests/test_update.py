@@ -1,7 +1,10 @@
 """UpdateLogicalLineList: after any sequence of edits the list is what a full read of the text
-gives, and every line outside the replaced slice is the same object, annotations and all."""
+gives, and every line outside the replaced slice is the same object, annotations and all; or
+the update is refused and the list stays as it was, which happens exactly when the host's
+description of the edit is wrong or the list is not as the module left it."""
 import contextlib
 import gc
+import io
 import os
 import random
 
@@ -41,13 +44,22 @@ def edited(doc, first, old_count, new, open_end=False):
     return text, (first, end - first, end - first + len(text) - len(doc))
 
 
-def edit(doc, lines, first, old_count, new, open_end=False):
-    """Edits doc as `edited` does and updates `lines` to match. Checks the contract; returns
-    the new doc."""
+def right(old, new, first, old_count, new_count):
+    """Whether the edit describes the change: outside the lines it names, the texts are the same
+    lines, cut as BytesIO.readline cuts them."""
+    a, b = io.BytesIO(old).readlines(), io.BytesIO(new).readlines()
+    return (first + old_count <= len(a) and first + new_count <= len(b) and a[:first] == b[:first]
+            and a[first + old_count:] == b[first + new_count:])
+
+
+def edit(doc, lines, first, old_count, new, open_end=False, told=True):
+    """Edits doc as `edited` does and updates `lines` to match, telling the edit or leaving the
+    module to find it. Checks the contract; returns the new doc."""
     text, arguments = edited(doc, first, old_count, new, open_end)
     for line in (before := list(lines)):
         line.SetScopeName(line)  # an annotation that must stay with the object
-    index, removed, added = PARSER.UpdateLogicalLineList(lines, b"".join(text), *arguments)
+    index, removed, added = PARSER.UpdateLogicalLineList(lines, b"".join(text),
+                                                         *arguments[:3 * told])
     assert view(lines) == view(PARSER.GetLogicalLineListFromBuffer(b"".join(text)))
     assert lines[index:index + len(added)] == added and len(lines) == len(before) - removed + len(added)
     kept = before[:index] + before[index + removed:]
@@ -62,9 +74,9 @@ def edit(doc, lines, first, old_count, new, open_end=False):
                 max_size=8))
 def test_random_edits(doc, edits):
     lines = PARSER.GetLogicalLineListFromBuffer(b"".join(doc))
-    for where, old_count, new, open_end in edits:
+    for step, (where, old_count, new, open_end) in enumerate(edits):
         first = int(where * len(doc))
-        doc = edit(doc, lines, first, min(old_count, len(doc) - first), new, open_end)
+        doc = edit(doc, lines, first, min(old_count, len(doc) - first), new, open_end, step % 2)
     doc = edit(doc, lines, 0, len(doc), [])  # the whole text deleted, then written again
     edit(doc, lines, 0, 0, PIECES)
 
@@ -167,15 +179,104 @@ def test_edits_of_real_files(name):
     for i in range(40):  # pastes and cuts too, which split and renumber groups of lines
         first = rng.randrange(len(doc) + 1)
         old_count = min(rng.choice((0, 1, 2, 30)), len(doc) - first)
-        doc = edit(doc, lines, first, old_count, rng.sample(doc, rng.choice((0, 1, 2, 70))))
+        doc = edit(doc, lines, first, old_count, rng.sample(doc, rng.choice((0, 1, 2, 70))),
+                   told=i % 3 != 0)
+
+
+# How a host gets an edit wrong, each from the true (first, old count, new count) and a number
+# from 1 to 3; and how it may widen one, which is still right.
+WRONG = {
+    "first line later": lambda f, o, n, k: (f + k, o, n),
+    "first line earlier": lambda f, o, n, k: (max(f - k, 0), o, n),
+    "old count off by one": lambda f, o, n, k: (f, max(o + (1 if k % 2 else -1), 0), n),
+    "new count off by one": lambda f, o, n, k: (f, o, max(n + (1 if k % 2 else -1), 0)),
+    "insertion told as a replacement": lambda f, o, n, k: (f, o + 1, n),
+}
+WIDER = lambda f, o, n, k: (max(f - k, 0), o + k + f - max(f - k, 0), n + k + f - max(f - k, 0))
+REAL_FILES = ["textwrap.py", "shlex.py", "tokenize.py"]
+
+
+def outcome(lines, data, arguments):
+    """Updates `lines`, or checks that the refusal left them as they were. Returns whether the
+    update went through, having checked that the list is then a full read of `data`."""
+    before = numbers(lines)
+    try:
+        PARSER.UpdateLogicalLineList(lines, data, *arguments)
+    except ValueError:
+        assert numbers(lines) == before
+        return False
+    assert view(lines) == view(PARSER.GetLogicalLineListFromBuffer(data))
+    return True
+
+
+@settings(max_examples=150, deadline=None)
+@given(st.sampled_from(REAL_FILES), st.floats(0, 1), st.integers(0, 3), st.integers(0, 3),
+       st.floats(0, 1), st.integers(1, 3), st.sampled_from(sorted(WRONG) + ["two edits as one"]))
+def test_a_description_is_refused_exactly_when_it_is_wrong(name, where, old_count, count, other,
+                                                           k, kind):
+    with open(os.path.join(STDLIB, name), "rb") as f:
+        doc = f.readlines()
+    first = int(where * len(doc))
+    rng = random.Random(first)
+    new = rng.sample(doc, count)
+    text, true = edited(doc, first, min(old_count, len(doc) - first), new)
+    if kind == "two edits as one":  # a second edit elsewhere, left untold
+        at = int(other * len(text))
+        text, _ = edited(text, at, min(1, len(text) - at), rng.sample(doc, k - 1))
+        told = true
+    else:
+        told = WRONG[kind](*true, k)
+    old, data = b"".join(doc), b"".join(text)
+    for arguments in (told, WIDER(*true, k), true, ()):
+        lines = PARSER.GetLogicalLineListFromBuffer(old)
+        assert outcome(lines, data, arguments) == (arguments == () or right(old, data, *arguments))
+
+
+@pytest.mark.parametrize("options, base", [
+    (dict(copy_strings=False), {}), (dict(skip_whitespace_lines=False), {}),
+    (dict(remove_comments=False), {}), (dict(include_line_text=False), {}),
+    (dict(feature_version=(3, 12)), {}), (dict(feature_version=(3, 14)), {}),
+    (dict(feature_version=(3, 15)), dict(feature_version=(3, 14))),  # lazy imports only
+])
+def test_an_update_reads_with_the_options_of_the_read(options, base):
+    text = b"# c\nx = f'{'a'}'  # b\n"
+    parser = logicalline.CreateLogicalLineParser(**base)
+    for reader, updater in [(logicalline.CreateLogicalLineParser(**options), parser),
+                            (parser, logicalline.CreateLogicalLineParser(**options))]:
+        lines = reader.GetLogicalLineListFromBuffer(text)
+        with pytest.raises(ValueError, match="other options"):
+            updater.UpdateLogicalLineList(lines, text, 1, 1, 1)
+        same = logicalline.CreateLogicalLineParser(**(options if reader is not parser else base))
+        same.UpdateLogicalLineList(lines, text + b"y\n", 2, 0, 1)  # another parser, same options
+        assert view(lines) == view(reader.GetLogicalLineListFromBuffer(text + b"y\n"))
+
+
+def test_text_after_a_last_line_without_a_line_feed_changes_that_line():
+    lines = PARSER.GetLogicalLineListFromBuffer(b"x = 1\ny = 2")
+    assert not outcome(lines, b"x = 1\ny = 23\nz\n", (2, 0, 2))
+    assert outcome(lines, b"x = 1\ny = 23\nz\n", (1, 1, 2))
+
+
+def test_the_record_keeps_the_text_as_read():
+    data = bytearray(b"x = 1\ny = 2\n")
+    lines = PARSER.GetLogicalLineList(io.BytesIO(data).readline)  # kept line by line
+    data[4:5] = b"3"  # edited in place: the record's copy is still the old text
+    assert not outcome(lines, data, (1, 1, 1)) and outcome(lines, data, (0, 1, 1))
+    data[:] = b"x = 3\nz = 2\n"
+    lines = PARSER.GetLogicalLineListFromBuffer(b"x = 3\ny = 2\n")
+    assert not outcome(lines, data, (0, 1, 1)) and outcome(lines, data, (1, 1, 1))
+    pieces = iter([b"x = 1\ny = 2\n", b"z = 3\n", b""])  # not cut as BytesIO cuts
+    lines = PARSER.GetLogicalLineList(pieces.__next__)
+    with pytest.raises(ValueError, match="read it again"):
+        PARSER.UpdateLogicalLineList(lines, b"x = 1\ny = 2\nz = 4\n", 2, 1, 1)
 
 
 @pytest.mark.parametrize("args, error", [
     ((b"x = 1\ny = 2\n", 3, 0, 0), ValueError),  # past the end of the text
     ((b"x = 1\ny = 2\n", 1, 1, 2), ValueError),  # more new lines than the text has
-    ((b"x = 1\n", 0, 0, 0), ValueError),         # the lines run past the old text
+    ((b"x = 1\n", 0, 0, 0), ValueError),         # a line went that the edit does not name
     ((b"x = 1\ny = 2\nz\x00\n", 2, 0, 1), ValueError), ((b"x = 1\ny = 2\n", -1, 0, 0), ValueError),
-    (("x = 1\ny = 2\n", 0, 0, 0), TypeError),
+    (("x = 1\ny = 2\n", 0, 0, 0), TypeError), ((b"x = 1\ny = 2\n", 0), TypeError),  # half an edit
 ])
 def test_refusals_leave_the_list_alone(args, error):
     before = list(lines := PARSER.GetLogicalLineListFromBuffer(b"x = 1\ny = 2\n"))

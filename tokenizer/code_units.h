@@ -29,7 +29,6 @@ enum CharClass : uint8_t {
   kLineBreak = 16,  // LF, CR
   kQuote = 32,      // ' and "
   kNameChar = 64,   // ASCII letters, digits and '_'
-  kPrefixLetter = 128,  // letters that may begin a string prefix: r, b, u, f in either case
 };
 
 // One row per byte value, built at compile time.
@@ -45,9 +44,6 @@ struct CharClassTable {
       if (b == '\n' || b == '\r') c |= kLineBreak;
       if (b == '\'' || b == '"') c |= kQuote;
       if ((c & (kAsciiLetter | kAsciiDigit)) || b == '_') c |= kNameChar;
-      if (b == 'r' || b == 'b' || b == 'u' || b == 'f' || b == 'R' || b == 'B' || b == 'U' ||
-          b == 'F')
-        c |= kPrefixLetter;
       fRows[b] = c;
     }
   }

@@ -39,10 +39,9 @@ const char* TerminatorOf(const char* lineStart, const char* end) {
   return end > lineStart && end[-1] == '\r' ? end - 1 : end;
 }
 
-// Letters that may begin the prefix of a formatted string: f and r (rf), and t with its reading.
+// True when b may begin the prefix of a formatted string that the rules read.
 bool MayOpenFormatted(unsigned b, StringRules rules) {
-  const unsigned letter = AsciiLower(b);
-  return letter == 'f' || letter == 'r' || (letter == 't' && rules == StringRules::kTemplates);
+  return kFormattedFirstLetters[static_cast<int>(rules)].Has(b);
 }
 
 uint8_t WordOf(const char* p, const char* q) {
@@ -58,8 +57,13 @@ void NoteFieldToken(FormattedStrings* strings, const ScanCursor* cursor, const c
       strings->fFirstStart = OffsetOf(cursor, p);
       strings->fFirstEnd = OffsetOf(cursor, q);
       strings->fWordsBeforeFirst = strings->fWords;
-    } else if (word == kElseWord) {
-      strings->fElseAfterFirst = 1;
+    } else {
+      if (!strings->fSecondNoted) {
+        const std::string_view second(p, static_cast<size_t>(q - p));
+        strings->fImportAfterFirst = second == "import" || second == "from";
+        strings->fSecondNoted = 1;
+      }
+      if (word == kElseWord) strings->fElseAfterFirst = 1;
     }
   }
   strings->fWords |= word;
@@ -211,7 +215,7 @@ Step ScanField(FormattedStrings* strings, const ScanCursor* cursor, const char* 
       continue;
     }
     if (b == '#') return {end, Outcome::kRunsOn};  // the comment takes the rest of the line
-    if (IsQuote(b) || MayOpenFormatted(b, strings->fRules) || HasClass(b, kPrefixLetter)) {
+    if (IsQuote(b) || kPrefixFirstLetters.Has(b)) {
       const StringStart string = FindStringStart(p, end, strings->fRules);
       if (string.fQuote) {
         NoteFieldToken(strings, cursor, p, string.fQuote + 1, 0);
@@ -305,6 +309,8 @@ void BeginFormattedLine(FormattedStrings* strings, const ScanState* state) {
   strings->fFirstStart = -1;
   strings->fFirstEnd = -1;
   strings->fElseAfterFirst = 0;
+  strings->fSecondNoted = 0;
+  strings->fImportAfterFirst = 0;
 }
 
 // Kept out of the classic reading's loop, which only tests for a stack to call it with.

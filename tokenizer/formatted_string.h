@@ -42,6 +42,8 @@ struct FormattedStrings {
   uint8_t fWords;             // FieldWord bits of the outermost string's fields so far
   uint8_t fWordsBeforeFirst;  // fWords before the line's first field token
   uint8_t fElseAfterFirst;    // 1 when an "else" follows that token on the line
+  uint8_t fSecondNoted;       // 1 once a second field token was noted on the line
+  uint8_t fImportAfterFirst;  // 1 when that second token is "import" or "from"
   int fFirstStart;            // offsets of the line's first field token; -1 while none
   int fFirstEnd;
   FormattedLevel fLevels[kFormattedDepthLimit];
@@ -53,23 +55,15 @@ void ResetFormattedStrings(FormattedStrings* strings, StringRules rules);
 // Notes, before a physical line is scanned, whether it begins inside a field.
 void BeginFormattedLine(FormattedStrings* strings, const ScanState* state);
 
-// Letters of the prefixes of formatted strings: f, r (rf), t (t-strings).
-struct PrefixLetters {
-  bool fRows[256];
-  constexpr PrefixLetters() : fRows() {
-    for (unsigned char letter : {'f', 'r', 't', 'F', 'R', 'T'}) fRows[letter] = true;
-  }
-};
-inline constexpr PrefixLetters kFormattedLetters;
-
 // False when no formatted string can begin at p, after a blank, nor run on: a quick test that
-// spares most tokens the call of ScanFormattedToken. The zero byte after the text ends it.
+// spares most tokens the call of ScanFormattedToken. The zero byte after the text ends it, so
+// that a letter is never its last byte.
 inline bool MayScanFormatted(const ScanState* state, const char* p) {
   if (state->fComplete == 0) return true;  // a string runs on, or no token was scanned yet
   if (*p == ' ') p++;
   if (IsBlank(Byte(p))) return true;  // more blanks: the call skips them
-  return kFormattedLetters.fRows[Byte(p)] &&
-         (IsQuote(Byte(p + 1)) || kFormattedLetters.fRows[Byte(p + 1)]);
+  if (!kFormattedLetters.Has(Byte(p))) return false;
+  return IsQuote(Byte(p + 1)) || (kFormattedLetters.Has(Byte(p + 1)) && IsQuote(Byte(p + 2)));
 }
 
 // Scans the next token as ScanNextToken does when it is a formatted string, or one that runs

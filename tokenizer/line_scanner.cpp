@@ -130,8 +130,15 @@ void ScanNextToken(const OperatorTable* table, ScanState* state, ScanCursor* cur
         pos = ScanNumber(pos, end);
         break;
       case STRING_TOKEN: {
-        const char* body = ScanStringStart(pos, end, state);
-        pos = body ? ScanStringBody(state, cursor, body) : pos + StepOverChar(pos, end);
+        // The classic reading's prefixes start strings here; one that a later reading drops
+        // is a name there, which the string follows as a token of its own.
+        const char* body = ScanStringStart(pos, end, state, cursor->fRules);
+        if (body) {
+          pos = ScanStringBody(state, cursor, body);
+        } else {
+          state->fTokenId = NAME_TOKEN;
+          pos = ScanNameEnd(pos, end);
+        }
         break;
       }
       case NEWLINE_TOKEN:

@@ -12,6 +12,7 @@ struct ScanCursor {
   const char* fLineEnd;    // one past its last byte, terminator included
   const char* fPos;        // where the next scan begins
   int fAtEnd;              // 1 once a call found no further token
+  StringRules fRules;      // the string prefixes of the reading
 };
 
 // The offset in the logical line text of a position on the cursor's line.

@@ -15,8 +15,8 @@
 
 int LineTokenIdForStart(const char* p, const char* end) {
   const int id = TokenIdForStart(&kOperatorTable, p, end);
-  // A prefix is one letter or two: most names show they are none by their second byte.
-  if (id != NAME_TOKEN || end - p < 2 || !HasClass(Byte(p + 1), kQuote | kAsciiLetter)) return id;
+  if (id != NAME_TOKEN || !kPrefixFirstLetters.Has(Byte(p)) || !MayOpenPrefixedString(p, end))
+    return id;
   return StartsTemplateString(p, end) ? STRING_TOKEN : id;
 }
 

@@ -27,9 +27,9 @@ const char* OpenQuote(const char* p, const char* end, ScanState* state) {
 
 }  // namespace
 
-const char* ScanStringStart(const char* p, const char* end, ScanState* state) {
+const char* ScanStringStart(const char* p, const char* end, ScanState* state, StringRules rules) {
   if (p < end && IsQuote(Byte(p))) return OpenQuote(p, end, state);  // most strings: no prefix
-  const StringStart start = FindStringStart(p, end, StringRules::kClassic);
+  const StringStart start = FindStringStart(p, end, rules);
   if (start.fQuote) return OpenQuote(start.fQuote, end, state);
   state->fTokenId = ERROR_TOKEN;
   state->fQuote = 0;

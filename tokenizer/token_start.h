@@ -7,6 +7,7 @@
 #include "core/token_ids.h"
 #include "tokenizer/code_units.h"
 #include "tokenizer/operator_table.h"
+#include "tokenizer/string_prefixes.h"
 
 // The scanner's result and carry-over record.
 struct ScanState {
@@ -22,16 +23,16 @@ struct ScanState {
 constexpr ScanState kFreshScan = {
     .fTokenId = 0, .fStart = -1, .fEnd = -1, .fComplete = 0, .fQuote = 0, .fTriple = 0};
 
-// Returns the position just after the opening quote(s) when an optional prefix and a quote
-// start at p, writing STRING_TOKEN, the quote and the triple flag; otherwise writes
-// ERROR_TOKEN and returns nullptr.
-const char* ScanStringStart(const char* p, const char* end, ScanState* state);
+// Returns the position just after the opening quote(s) when an optional prefix that the rules
+// accept and a quote start at p, writing STRING_TOKEN, the quote and the triple flag;
+// otherwise writes ERROR_TOKEN and returns nullptr.
+const char* ScanStringStart(const char* p, const char* end, ScanState* state, StringRules rules);
 
 // What a first byte can begin. The rule tries, in order, a string, a name, a line break, a
 // number, a comment and an operator; the class of the byte says which of them can hold.
 enum class Start : uint8_t {
   kName,          // a letter that no string prefix begins with, or "_"
-  kNameOrString,  // r, b, u, f in either case: a string when a quote follows the prefix
+  kNameOrString,  // a letter that begins a classic prefix: a string when a quote follows it
   kString,        // a quote
   kNumber,        // an ASCII digit
   kDot,           // a number when a digit follows, else an operator
@@ -44,7 +45,7 @@ enum class Start : uint8_t {
 constexpr Start StartOf(unsigned b) {
   if (b >= 0x80) return Start::kNonAscii;
   if (HasClass(b, kQuote)) return Start::kString;
-  if (HasClass(b, kPrefixLetter)) return Start::kNameOrString;
+  if (kClassicFirstLetters.Has(b)) return Start::kNameOrString;
   if (HasClass(b, kAsciiLetter) || b == '_') return Start::kName;
   if (HasClass(b, kAsciiDigit)) return Start::kNumber;
   if (HasClass(b, kLineBreak)) return Start::kLineBreak;
@@ -61,8 +62,9 @@ struct StartTable {
 };
 inline constexpr StartTable kStarts;
 
-// Returns the id of the token that begins at p in [p, end). Never fails. For an operator, the
-// row found is stored in *row when row is given. Inline: the scanner asks it of every token.
+// Returns the id of the token that begins at p in [p, end), with the string prefixes of the
+// classic reading. Never fails. For an operator, the row found is stored in *row when row is
+// given. Inline: the scanner asks it of every token.
 inline int TokenIdForStart(const OperatorTable* table, const char* p, const char* end,
                            const OperatorEntry** row = nullptr) {
   if (p >= end) return ERROR_TOKEN;
@@ -70,11 +72,9 @@ inline int TokenIdForStart(const OperatorTable* table, const char* p, const char
     case Start::kName:
       return NAME_TOKEN;
     case Start::kNameOrString: {
-      // A prefix is one letter or two before a quote, so a name such as "return" shows itself
-      // at its second byte.
-      if (p + 1 < end && !HasClass(Byte(p + 1), kQuote | kPrefixLetter)) return NAME_TOKEN;
+      if (!MayOpenPrefixedString(p, end)) return NAME_TOKEN;
       ScanState scratch = kFreshScan;
-      return ScanStringStart(p, end, &scratch) ? STRING_TOKEN : NAME_TOKEN;
+      return ScanStringStart(p, end, &scratch, StringRules::kClassic) ? STRING_TOKEN : NAME_TOKEN;
     }
     case Start::kString:
       return STRING_TOKEN;

@@ -84,8 +84,8 @@ def parse_options(text):
     return settings
 
 
-# The newest Python whose strings the module reads as that version does.
-NEWEST_PYTHON = (3, 14)
+# The newest Python that the module reads as that version does; later ones read as it does.
+NEWEST_PYTHON = logicalline.kNewestFeatureVersion
 
 
 def parse_python(text):
@@ -141,9 +141,9 @@ def argument_parser():
                            metavar="NAME=BOOL,...", help="set parser options (default: all on)")
     arguments.add_argument(
         "--python", type=parse_python, default=NEWEST_PYTHON, metavar="X.Y",
-        help="read strings as Python X.Y does: f-strings with nested fields from 3.12, "
-             "t-strings from 3.14 (default: %s, the newest the module knows, so that code reads "
-             "as it runs)" % ".".join(map(str, NEWEST_PYTHON)))
+        help="read code as Python X.Y does: f-strings with nested fields from 3.12, "
+             "t-strings from 3.14, lazy imports from 3.15 (default: %s, the newest the module "
+             "knows, so that code reads as it runs)" % ".".join(map(str, NEWEST_PYTHON)))
     arguments.add_argument("--jobs", "-j", type=parse_jobs, default=1, metavar="N",
                            help="parse in N worker processes, 0 for one per core (default: 1)")
     arguments.add_argument("--quiet", "-q", action="store_true", help="show no progress")

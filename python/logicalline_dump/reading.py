@@ -128,6 +128,11 @@ def source_to_utf8(data: bytes) -> bytes:
 def read_lines(parser, data, offset, first_line, line_count):
     """The one call into the module: the logical lines of data[offset:], numbered from
     first_line, that start within line_count physical lines."""
+    if offset and data.startswith(BOM, offset):
+        # The module skips a byte-order mark that opens its buffer, but only the one that opens
+        # the file is no part of the source: this one stays, behind another for the module to
+        # skip. The copy of the rest of the file is made only for such a rare window.
+        return parser.GetLogicalLineListFromBuffer(BOM + data[offset:], first_line, line_count)
     return parser.GetLogicalLineListFromBuffer(memoryview(data)[offset:], first_line, line_count)
 
 
