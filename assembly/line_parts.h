@@ -6,12 +6,14 @@
 
 #include <cstddef>
 
+#include "assembly/token_cache.h"
 #include "core/token_position.h"
 #include "tokenizer/operator_table.h"
 #include "tokenizer/string_prefixes.h"
 
 struct ReadOptions {
   const OperatorTable* fOperatorTable;
+  TokenTexts* fTokenTexts;    // the texts that the reads of the parser's interpreter share
   bool fCopyStrings;          // string tokens keep their own text, else the placeholder
   bool fSkipWhitespaceLines;  // a line of comments only is not handed back
   bool fRemoveComments;       // comment tokens are not listed

@@ -135,13 +135,18 @@ int MeasureIndent(LineTokens* tokens, const char* p, const char* tokenStart) {
   return 0;
 }
 
-// Returns the token object of an id whose text is fixed: an operator's canonical text, or the
-// string placeholder. Made once for the process.
-PyObject* FixedToken(ReadingState* state, int id) {
-  if (PyObject* known = CachedFixedText(id)) return known;
+// Makes and stores the token object of an id whose text is fixed, at its first sighting.
+[[gnu::noinline]] PyObject* NewFixedToken(ReadingState* state, int id) {
   const char* text = id == STRING_TOKEN ? kStringPlaceholder
                                         : OperatorText(state->fOptions.fOperatorTable, id);
-  return StoreFixedText(id, text);
+  return StoreFixedText(state->fOptions.fTokenTexts, id, text);
+}
+
+// Returns the token object of an id whose text is fixed: an operator's canonical text, or the
+// string placeholder. Made once for the interpreter.
+PyObject* FixedToken(ReadingState* state, int id) {
+  if (PyObject* known = CachedFixedText(state->fOptions.fTokenTexts, id)) return known;
+  return NewFixedToken(state, id);
 }
 
 // Places a token that may have begun on an earlier physical line: on the line, as read, that
@@ -175,7 +180,7 @@ PyObject* MakeToken(ReadingState* state, int lineStart, int* lineIndex, int* col
   *column = scan.fStart - lineStart;
   switch (scan.fTokenId) {
     case NAME_TOKEN:
-      return CachedBytes(text + scan.fStart, scan.fEnd - scan.fStart);
+      return CachedBytes(state->fOptions.fTokenTexts, text + scan.fStart, scan.fEnd - scan.fStart);
     case NUMBER_TOKEN:   // rarely repeated, and a long literal holds little else: they would
     case COMMENT_TOKEN:  // only push the names out of the cache
       return PyBytes_FromStringAndSize(text + scan.fStart, scan.fEnd - scan.fStart);

@@ -1,6 +1,7 @@
-// SharedTable: the one kind of process-wide state the module keeps besides its constants. Token
-// texts, fTokens entries and their positions recur from line to line and from file to file, so
-// a bounded table hands out the same immutable object again instead of making a new one.
+// SharedTable: the one kind of table that reads share. Token texts, fTokens entries and their
+// positions recur from line to line and from file to file, so a bounded table hands out the same
+// immutable object again instead of making a new one. Each interpreter that imports the module
+// has tables of its own, which only its own code, under its own lock, reads and writes.
 //
 // What the tables rely on:
 // - A slot is empty (all zero) or full. A full slot owns one reference to each object it
@@ -16,8 +17,9 @@
 // - A set holds kWays slots, the one found last first. A new slot takes the last way and moves
 //   to the first only when it is found again, so a run of keys seen once (fresh names, the
 //   numbers of a long literal) passes through the last way and leaves the keys that recur.
-// - Release empties every slot; the table fills again as it is used. The module releases its
-//   tables when it is freed, and a leak check releases them to count what reading holds.
+// - All zero is empty, so a table in freshly zeroed memory is ready. Release empties every slot;
+//   the table fills again as it is used. The module releases its tables when it is freed, and a
+//   leak check releases them to count what reading holds.
 #pragma once
 
 #define PY_SSIZE_T_CLEAN

@@ -6,6 +6,10 @@
  *   LLAppendAttribDirect append = (LLAppendAttribDirect)table[LL_APPEND_ATTRIB_DIRECT];
  *
  * The order of the entries is the interface. Every entry runs with the interpreter lock held.
+ * The table is the same in every interpreter of the process, and each entry works in the
+ * interpreter that calls it, on that interpreter's lines: a host module may obtain it once per
+ * interpreter, or keep the pointer from the first. Entries 0 and 2 make or return the
+ * LogicalLine type of the calling interpreter, that of the logicalline module it imported last.
  * A "line" argument is a borrowed reference to a LogicalLine (check it with LL_IS_LOGICAL).
  * Entries returning int give 0 on success and -1 with a Python exception set on failure, unless
  * noted; entries returning PyObject* give NULL with an exception set on failure. */
@@ -38,11 +42,14 @@ enum LogicalLineTableIndex {
   LL_GET_STRING_TOKEN_TYPE_DIRECT = 13
 };
 
-/* 0: a new empty LogicalLine (type kUnknown, no tokens, line count 0), or NULL. */
+/* 0: a new empty LogicalLine of the calling interpreter (type kUnknown, no tokens, line count
+ * 0), or NULL (RuntimeError where the interpreter never imported logicalline). */
 typedef PyObject* (*LLCreateEmptyLogical)(void);
-/* 1: 1 when the object's type is exactly LogicalLine, else 0; never fails. */
+/* 1: 1 when the object is a LogicalLine (its type is exactly a LogicalLine type), else 0;
+ * never fails. */
 typedef int (*LLIsLogical)(PyObject* object);
-/* 2: a new reference to the LogicalLine type object; never fails. */
+/* 2: a new reference to the calling interpreter's LogicalLine type object, or NULL with
+ * RuntimeError where the interpreter never imported logicalline. */
 typedef PyObject* (*LLGetLogicalTypeObject)(void);
 /* 3: borrowed argument name `index` of a function definition line, or NULL (ValueError on
  * another line type, IndexError for a bad index). */

@@ -16,15 +16,13 @@
 
 namespace {
 
-PyObject* gCreateHook = nullptr;  // owned; null until SetLogicalCreateFunction
-
 bool PartsAreValid(const LineParts& parts) {
   if (parts.fIndentLevel >= 0 && parts.fFirstLine >= 0 && parts.fLineCount >= 1) return true;
   RaiseBadInternalCall(kConstructionCheckLine);
   return false;
 }
 
-PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
+PyObject* CallCreateHook(LineState* shared, PyObject* hook, const LineParts& parts) {
   PyRef tokens = PyRef::Steal(PyTuple_New(parts.fTokenCount));
   if (!tokens) return nullptr;
   PyRef positions = PyRef::Steal(PyTuple_New(parts.fTokenCount));
@@ -32,7 +30,7 @@ PyObject* CallCreateHook(PyObject* hook, const LineParts& parts) {
   for (int i = 0; i < parts.fTokenCount; i++) {
     Py_INCREF(parts.fTokens[i]);
     PyTuple_SET_ITEM(tokens.Get(), i, parts.fTokens[i]);
-    PyObject* pair = PositionTuple(parts.fPositions[i]);
+    PyObject* pair = PositionTuple(shared->fEntries, parts.fPositions[i]);
     if (!pair) return nullptr;
     PyTuple_SET_ITEM(positions.Get(), i, pair);
   }
@@ -82,8 +80,9 @@ uint8_t FlagIf(int condition, LineFlag flag) { return condition ? flag : 0; }
 
 }  // namespace
 
-PyObject* CreateNativeLogicalLine(const LineParts& parts, bool take) {
-  LogicalLine* line = PartsAreValid(parts) ? NewLogicalLine(StorageBytes(parts)) : nullptr;
+PyObject* CreateNativeLogicalLine(PyTypeObject* lineType, const LineParts& parts, bool take) {
+  LogicalLine* line =
+      PartsAreValid(parts) ? NewLogicalLine(lineType, StorageBytes(parts)) : nullptr;
   if (!line) {
     if (take) ReleaseTokens(parts);
     return nullptr;
@@ -106,23 +105,26 @@ PyObject* CreateNativeLogicalLine(const LineParts& parts, bool take) {
   return owner.Release();
 }
 
-PyObject* CreateLogicalLine(const LineParts& parts, bool take) {
-  if (!gCreateHook) return CreateNativeLogicalLine(parts, take);
+PyObject* CreateLogicalLine(LineState* shared, const LineParts& parts, bool take) {
+  if (!shared->fCreateHook) return CreateNativeLogicalLine(shared->fLineType, parts, take);
   PyObject* made = nullptr;
   if (PartsAreValid(parts)) {
-    PyRef hook = PyRef::FromBorrowed(gCreateHook);  // the hook may replace itself while running
-    made = CallCreateHook(hook.Get(), parts);
+    // The hook may replace itself while running.
+    PyRef hook = PyRef::FromBorrowed(shared->fCreateHook);
+    made = CallCreateHook(shared, hook.Get(), parts);
   }
   if (take) ReleaseTokens(parts);  // the hook's arguments hold references of their own
   return made;
 }
 
-bool HasCreateHook() { return gCreateHook != nullptr; }
+bool HasCreateHook(const LineState* shared) { return shared->fCreateHook != nullptr; }
 
-void SetCreateHook(PyObject* hook) {
+void SetCreateHook(LineState* shared, PyObject* hook) {
   // Install before releasing the old hook: its release may run code that installs another.
   Py_INCREF(hook);
-  PyObject* old = gCreateHook;
-  gCreateHook = hook;
+  PyObject* old = shared->fCreateHook;
+  shared->fCreateHook = hook;
   Py_XDECREF(old);
 }
+
+void DropCreateHook(LineState* shared) { Py_CLEAR(shared->fCreateHook); }

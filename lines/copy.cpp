@@ -30,7 +30,7 @@ PyObject* CopyLogicalLine(LogicalLine* source) {
                            .fLineTextLength = text ? strlen(text) : 0,
                            .fOffset = SourceOffsetOf(source),
                            .fLazyImports = lazyImports};
-  PyRef copy = PyRef::Steal(CreateNativeLogicalLine(parts));
+  PyRef copy = PyRef::Steal(CreateNativeLogicalLine(Py_TYPE(source), parts));
   if (!copy) return nullptr;
   LogicalLine* line = AsLine(copy.Get());
   Py_XINCREF(source->fScopeName);

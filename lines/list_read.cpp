@@ -22,15 +22,16 @@ namespace {
 // halfway through: the lines are then the host's objects, never numbered (one may be a line of
 // another list, whose numbering it keeps), and *table is cleared, so that the list is never
 // recorded and an update refuses it. Returns 0, or -1.
-int ReadLines(ReadingState* state, int64_t stop, PyObject* list, ShiftTable** table) {
+int ReadLines(LineState* shared, ReadingState* state, int64_t stop, PyObject* list,
+              ShiftTable** table) {
   while (!(stop != -1 && state->fLineNumber >= stop) && !state->fSource.fAtEnd) {
     LineParts parts;
     const int built = BuildLogicalLine(state, &parts);
     if (built < 0) return -1;
     if (built == 0) continue;
-    if (*table && HasCreateHook()) *table = nullptr;
-    PyRef line = PyRef::Steal(*table ? CreateNativeLogicalLine(parts, true)
-                                     : CreateLogicalLine(parts, true));
+    if (*table && HasCreateHook(shared)) *table = nullptr;
+    PyRef line = PyRef::Steal(*table ? CreateNativeLogicalLine(shared->fLineType, parts, true)
+                                     : CreateLogicalLine(shared, parts, true));
     GiveUpTokens(state);  // taken over by the call, whatever its outcome
     if (!line) return -1;
     if (line.Get() == Py_None) continue;
@@ -59,7 +60,7 @@ int SealRead(ShiftTable* table, PyObject* list, const ReadOptions& options,
 
 }  // namespace
 
-PyObject* ReadLineList(const ReadOptions& options, const LineSource& source) {
+PyObject* ReadLineList(LineState* shared, const ReadOptions& options, const LineSource& source) {
   PyRef list = PyRef::Steal(PyList_New(0));
   if (!list) return nullptr;
   const bool whole = source.fLineCount == -1;
@@ -77,7 +78,7 @@ PyObject* ReadLineList(const ReadOptions& options, const LineSource& source) {
   ShiftTable* table = nullptr;
   TextBuffer kept;
   InitTextBuffer(&kept);
-  if (source.fFirstLine == 0 && whole && !HasCreateHook()) {
+  if (source.fFirstLine == 0 && whole && !HasCreateHook(shared)) {
     table = NewShiftTable();
     if (!table) {
       ReleaseReadingState(&state);
@@ -86,7 +87,7 @@ PyObject* ReadLineList(const ReadOptions& options, const LineSource& source) {
     if (source.fReadline) KeepSourceText(&state.fSource, &kept);
   }
   ShiftTable* numbering = table;  // cleared when a hook takes over
-  int status = ReadLines(&state, stop, list.Get(), &numbering);
+  int status = ReadLines(shared, &state, stop, list.Get(), &numbering);
   if (status == 0 && numbering)
     status = SealRead(numbering, list.Get(), options, source, state.fSource, kept);
   ReleaseReadingState(&state);

@@ -10,6 +10,7 @@
 #include <cstdint>
 
 #include "assembly/line_parts.h"
+#include "lines/line_state.h"
 
 // Where the physical lines come from, and which of them start logical lines: from firstLine
 // (>= 0), lineCount of them (-1: all).
@@ -22,5 +23,6 @@ struct LineSource {
   int fLineCount;
 };
 
-// Returns a new list of the lines read, or nullptr with an exception set: no partial list.
-PyObject* ReadLineList(const ReadOptions& options, const LineSource& source);
+// Returns a new list of the lines read, made as `shared` makes them, or nullptr with an
+// exception set: no partial list.
+PyObject* ReadLineList(LineState* shared, const ReadOptions& options, const LineSource& source);

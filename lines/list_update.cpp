@@ -112,7 +112,7 @@ constexpr char kWrongEdit[] =
 // The record of a list that is not empty: the table that its first item shares, if any.
 ShiftTable* RecordOf(PyObject* lines) {
   PyObject* first = PyList_GET_ITEM(lines, 0);
-  return Py_TYPE(first) == &LogicalLineType ? AsLine(first)->fShiftTable : nullptr;
+  return IsLogicalLine(first) ? AsLine(first)->fShiftTable : nullptr;
 }
 
 // Refuses a list that is not exactly as the last read or update left it, or that was read with
@@ -216,8 +216,8 @@ int64_t ReReadStart(PyObject* lines, const Edit& edit) {
 // Reads the new text from physical line `start`, at byte `from`, until the reader starts afresh
 // after the edit at a place where the old read also did, or the text ends. Appends the lines
 // read to `added` and stores the new number of the line where reading stopped. Returns 0, or -1.
-int ReRead(const ReadOptions& options, PyObject* lines, const Edit& edit, std::string_view next,
-           size_t from, int64_t start, PyObject* added, int64_t* stop) {
+int ReRead(const LineState* shared, const ReadOptions& options, PyObject* lines, const Edit& edit,
+           std::string_view next, size_t from, int64_t start, PyObject* added, int64_t* stop) {
   ReadingState state;
   InitBufferReading(&state, options, next.data(), next.data() + from, next.data() + next.size(),
                     start, false);
@@ -233,7 +233,7 @@ int ReRead(const ReadOptions& options, PyObject* lines, const Edit& edit, std::s
       status = built;
       continue;
     }
-    PyRef line = PyRef::Steal(CreateNativeLogicalLine(parts, true));
+    PyRef line = PyRef::Steal(CreateNativeLogicalLine(shared->fLineType, parts, true));
     GiveUpTokens(&state);  // taken over by the call, whatever its outcome
     if (!line || PyList_Append(added, line.Get()) != 0) status = -1;
   }
@@ -312,8 +312,9 @@ size_t ReservedGroups(Py_ssize_t added) {
 // Updates `lines`, numbered by `table`, for the edit, proved true, to the new text [data, end)
 // that `owner` holds. Returns the result, or nullptr with an exception set and `lines`
 // unchanged.
-PyObject* UpdateNumbered(const ReadOptions& options, PyObject* lines, ShiftTable* table,
-                         const Edit& edit, const char* data, const char* end, PyObject* owner) {
+PyObject* UpdateNumbered(const LineState* shared, const ReadOptions& options, PyObject* lines,
+                         ShiftTable* table, const Edit& edit, const char* data, const char* end,
+                         PyObject* owner) {
   const std::string_view old = RecordedText(table);
   const std::string_view next(data, static_cast<size_t>(end - data));
   const int64_t start = ReReadStart(lines, edit);
@@ -321,7 +322,8 @@ PyObject* UpdateNumbered(const ReadOptions& options, PyObject* lines, ShiftTable
   const size_t from = OldLineStart(lines, old, start, nullptr);
   PyRef added = PyRef::Steal(PyList_New(0));
   int64_t stop = 0;
-  if (!added || ReRead(options, lines, edit, next, from, start, added.Get(), &stop) != 0)
+  if (!added ||
+      ReRead(shared, options, lines, edit, next, from, start, added.Get(), &stop) != 0)
     return nullptr;
   // Old lines from the start up to where the re-read stopped, in the old numbering, go. The
   // ones after it are in the text after the edit, kept byte for byte: they move by the lines
@@ -351,8 +353,8 @@ PyObject* UpdateNumbered(const ReadOptions& options, PyObject* lines, ShiftTable
 
 // An empty list proves nothing about the text it came from: the new text is read in full, as
 // an edit of all of it, into a new numbering.
-PyObject* ReadIntoEmpty(const ReadOptions& options, PyObject* lines, const Edit* told,
-                        const char* data, const char* end, PyObject* owner) {
+PyObject* ReadIntoEmpty(const LineState* shared, const ReadOptions& options, PyObject* lines,
+                        const Edit* told, const char* data, const char* end, PyObject* owner) {
   const int64_t total = CountLines(std::string_view(data, static_cast<size_t>(end - data)));
   if (told && told->fFirst + told->fNewCount > total) {
     Refuse(kOutsideText);
@@ -361,16 +363,17 @@ PyObject* ReadIntoEmpty(const ReadOptions& options, PyObject* lines, const Edit*
   ShiftTable* table = NewShiftTable();
   if (!table) return PyErr_NoMemory();
   const Edit whole{.fFirst = 0, .fOldCount = 0, .fNewCount = total};
-  PyObject* result = UpdateNumbered(options, lines, table, whole, data, end, owner);
+  PyObject* result = UpdateNumbered(shared, options, lines, table, whole, data, end, owner);
   DropShiftTable(table);
   return result;
 }
 
 }  // namespace
 
-PyObject* UpdateLineList(const ReadOptions& options, PyObject* lines, const Edit* told,
-                         const char* data, const char* end, PyObject* owner) {
-  if (PyList_GET_SIZE(lines) == 0) return ReadIntoEmpty(options, lines, told, data, end, owner);
+PyObject* UpdateLineList(const LineState* shared, const ReadOptions& options, PyObject* lines,
+                         const Edit* told, const char* data, const char* end, PyObject* owner) {
+  if (PyList_GET_SIZE(lines) == 0)
+    return ReadIntoEmpty(shared, options, lines, told, data, end, owner);
   ShiftTable* recorded = RecordOf(lines);
   if (CheckRecord(recorded, lines, options) != 0) return nullptr;
   Edit edit{};
@@ -379,7 +382,7 @@ PyObject* UpdateLineList(const ReadOptions& options, PyObject* lines, const Edit
     return nullptr;
   ShiftTable* table = TableToRenumber(lines, recorded);
   if (!table) return nullptr;
-  PyObject* result = UpdateNumbered(options, lines, table, edit, data, end, owner);
+  PyObject* result = UpdateNumbered(shared, options, lines, table, edit, data, end, owner);
   DropShiftTable(table);
   return result;
 }

@@ -9,6 +9,7 @@
 
 #include <cstdlib>
 
+#include "core/module_type.h"
 #include "lines/line_type.h"
 
 namespace {
@@ -16,6 +17,7 @@ namespace {
 // Every object the line holds; the host's annotations are the ones that can close a cycle.
 int LineTraverse(PyObject* self, visitproc visit, void* arg) {
   LogicalLine* line = AsLine(self);
+  Py_VISIT(Py_TYPE(self));  // a heap type, which the line holds
   for (int i = 0; i < line->fTokenCount; i++) Py_VISIT(line->fTokenArray[i]);
   Py_VISIT(line->fScopeName);
   Py_VISIT(line->fTokensTuple);
@@ -34,6 +36,7 @@ int LineClear(PyObject* self) {
 }
 
 void LineDealloc(PyObject* self) {
+  PyTypeObject* type = Py_TYPE(self);
   PyObject_GC_UnTrack(self);
   LogicalLine* line = AsLine(self);
   // The positions and the line text are in the record's storage, freed with it.
@@ -43,33 +46,42 @@ void LineDealloc(PyObject* self) {
   Py_XDECREF(line->fScopeName);
   Py_XDECREF(line->fTokensTuple);
   Py_XDECREF(line->fLocalScopeName);
-  Py_TYPE(self)->tp_free(self);
+  type->tp_free(self);
+  Py_DECREF(type);
 }
 
 }  // namespace
 
-// Slots left out stay empty; the interpreter fills them in when the type is readied.
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wmissing-field-initializers"
-PyTypeObject LogicalLineType = {
-    .ob_base = PyVarObject_HEAD_INIT(nullptr, 0)
-    .tp_name = "LogicalLine",
-    .tp_basicsize = sizeof(LogicalLine),
-    .tp_itemsize = 1,
-    .tp_dealloc = LineDealloc,
-    .tp_flags = Py_TPFLAGS_DEFAULT | Py_TPFLAGS_HAVE_GC,  // no subclassing, no constructor
-    .tp_traverse = LineTraverse,
-    .tp_clear = LineClear,
-};
-#pragma GCC diagnostic pop
+PyTypeObject* NewLineType(PyObject* module, PyMethodDef* methods, PyGetSetDef* attributes) {
+  PyType_Slot slots[] = {
+      {Py_tp_dealloc, reinterpret_cast<void*>(LineDealloc)},
+      {Py_tp_traverse, reinterpret_cast<void*>(LineTraverse)},
+      {Py_tp_clear, reinterpret_cast<void*>(LineClear)},
+      {Py_tp_methods, methods},
+      {Py_tp_getset, attributes},
+      {0, nullptr},
+  };
+  // No subclassing, no constructor, no attribute of its own set from Python.
+  PyType_Spec spec = {
+      .name = "logicalline.LogicalLine",
+      .basicsize = sizeof(LogicalLine),
+      .itemsize = 1,
+      .flags = Py_TPFLAGS_DEFAULT | Py_TPFLAGS_HAVE_GC | Py_TPFLAGS_DISALLOW_INSTANTIATION |
+               Py_TPFLAGS_IMMUTABLETYPE,
+      .slots = slots,
+  };
+  return NewModuleType(module, &spec);
+}
 
-LogicalLine* NewLogicalLine(size_t storage) {
+bool IsLogicalLine(PyObject* object) { return Py_TYPE(object)->tp_dealloc == LineDealloc; }
+
+LogicalLine* NewLogicalLine(PyTypeObject* type, size_t storage) {
   static_assert(sizeof(LogicalLine) % alignof(PyObject*) == 0, "the storage starts aligned");
   if (storage > static_cast<size_t>(PY_SSIZE_T_MAX) - sizeof(LogicalLine)) {
     PyErr_NoMemory();
     return nullptr;
   }
-  LogicalLine* line = PyObject_GC_NewVar(LogicalLine, &LogicalLineType,  // untracked
+  LogicalLine* line = PyObject_GC_NewVar(LogicalLine, type,  // untracked
                                          static_cast<Py_ssize_t>(storage));
   if (!line) return nullptr;
   const ObjectList empty = {.fItems = nullptr, .fCount = 0, .fCapacity = 0};

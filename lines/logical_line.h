@@ -45,8 +45,13 @@ struct LogicalLine {
   uint32_t fGroup;          // its group in fShiftTable
 };
 
-// The type. Its methods and attributes are the Python surface's, set before it is readied.
-extern PyTypeObject LogicalLineType;
+// Returns a new LogicalLine type for `module`, with the Python surface's methods and attributes,
+// or nullptr with an exception set.
+PyTypeObject* NewLineType(PyObject* module, PyMethodDef* methods, PyGetSetDef* attributes);
+
+// True when the object is a LogicalLine, of whichever import of the module: none of them can be
+// subclassed, and all share their release function.
+bool IsLogicalLine(PyObject* object);
 
 inline LogicalLine* AsLine(PyObject* object) { return reinterpret_cast<LogicalLine*>(object); }
 
@@ -74,9 +79,9 @@ void AttachLine(LogicalLine* line, ShiftTable* table, uint32_t group);
 // no longer trusted until it is recorded again.
 void DetachLine(LogicalLine* line);
 
-// Returns a new record in the fresh state (no tokens, type kUnknown, fLocalScopeName None),
-// with `storage` bytes of storage after it, at LineStorage.
-LogicalLine* NewLogicalLine(size_t storage);
+// Returns a new record of `type` in the fresh state (no tokens, type kUnknown, fLocalScopeName
+// None), with `storage` bytes of storage after it, at LineStorage.
+LogicalLine* NewLogicalLine(PyTypeObject* type, size_t storage);
 
 inline char* LineStorage(LogicalLine* line) { return reinterpret_cast<char*>(line + 1); }
 

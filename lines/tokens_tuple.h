@@ -4,14 +4,26 @@
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
+#include "assembly/token_cache.h"
 #include "core/token_position.h"
 #include "lines/logical_line.h"
 
+// The parts of fTokens that one interpreter's lines share: positions, the ints in them, the str
+// shown for a token, and whole entries.
+struct EntryTables;
+
+// Returns new empty tables, or nullptr with MemoryError set.
+EntryTables* NewEntryTables();
+
 // Returns a new (line index, column) tuple of ints, or nullptr with an exception set.
-PyObject* PositionTuple(TokenPosition position);
+PyObject* PositionTuple(EntryTables* tables, TokenPosition position);
 
-// Returns the line's fTokens tuple, built at the first call and the same object after.
-PyObject* TokensTupleOf(LogicalLine* line);
+// Returns the line's fTokens tuple, built at the first call and the same object after, from the
+// tables of the line's interpreter and the texts that its reads share.
+PyObject* TokensTupleOf(EntryTables* tables, const TokenTexts* texts, LogicalLine* line);
 
-// Empties every table that reading shares: the entries and parts of fTokens, the token texts.
-void ReleaseSharedTables();
+// Empties the tables.
+void ReleaseEntryTables(EntryTables* tables);
+
+// Empties the tables and frees them.
+void FreeEntryTables(EntryTables* tables);

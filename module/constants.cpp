@@ -6,39 +6,43 @@
 
 #include "core/py_ref.h"
 #include "core/token_ids.h"
-#include "lines/logical_line.h"
 #include "module/parser.h"
 
-LineTypeRow LineTypeTable[kLineTypeCount] = {
-    {"kUnknown", "unknown", nullptr},
-    {"kClassDef", "class definition", nullptr},
-    {"kFunctionDef", "function definition", nullptr},
-    {"kStringExpression", "string expression", nullptr},
-    {"kAssignment", "assignment", nullptr},
-    {"kIfBeginning", "if statement start", nullptr},
-    {"kElseBeginning", "else statement start", nullptr},
-    {"kWhileBeginning", "while statement start", nullptr},
-    {"kForBeginning", "for statement start", nullptr},
-    {"kPass", "pass", nullptr},
-    {"kRaise", "raise", nullptr},
-    {"kTry", "try block start", nullptr},
-    {"kExcept", "except block start", nullptr},
-    {"kFinally", "finally block start", nullptr},
-    {"kAssert", "assert", nullptr},
-    {"kReturn", "return", nullptr},
-    {"kImport", "import", nullptr},
-    {"kFromImport", "from import", nullptr},
-    {"kPrint", "print", nullptr},
-    {"kDelete", "delete", nullptr},
-    {"kElifBeginning", "elif block start", nullptr},
-    {"kComment", "comment", nullptr},
-    {"kBlankLine", "blank line", nullptr},
-    {"kBreak", "break", nullptr},
-    {"kContinue", "continue", nullptr},
-    {"kWith", "with block start", nullptr},
+namespace {
+
+struct LineTypeRow {
+  const char* fName;         // the module attribute
+  const char* fDescription;  // content of the bytes constant
 };
 
-namespace {
+constexpr LineTypeRow kLineTypeRows[kLineTypeCount] = {
+    {"kUnknown", "unknown"},
+    {"kClassDef", "class definition"},
+    {"kFunctionDef", "function definition"},
+    {"kStringExpression", "string expression"},
+    {"kAssignment", "assignment"},
+    {"kIfBeginning", "if statement start"},
+    {"kElseBeginning", "else statement start"},
+    {"kWhileBeginning", "while statement start"},
+    {"kForBeginning", "for statement start"},
+    {"kPass", "pass"},
+    {"kRaise", "raise"},
+    {"kTry", "try block start"},
+    {"kExcept", "except block start"},
+    {"kFinally", "finally block start"},
+    {"kAssert", "assert"},
+    {"kReturn", "return"},
+    {"kImport", "import"},
+    {"kFromImport", "from import"},
+    {"kPrint", "print"},
+    {"kDelete", "delete"},
+    {"kElifBeginning", "elif block start"},
+    {"kComment", "comment"},
+    {"kBlankLine", "blank line"},
+    {"kBreak", "break"},
+    {"kContinue", "continue"},
+    {"kWith", "with block start"},
+};
 
 struct AttribKind {
   const char* fKindName;
@@ -53,11 +57,12 @@ constexpr AttribKind kAttribKinds[] = {
     {"kImportedAttribKind", nullptr, "imported attribute"},
 };
 
-int AddLineTypes(PyObject* dict) {
-  for (LineTypeRow& row : LineTypeTable) {
-    row.fObject = PyBytes_FromString(row.fDescription);
-    if (!row.fObject) return -1;
-    if (PyDict_SetItemString(dict, row.fName, row.fObject) != 0) return -1;
+int AddLineTypes(PyObject* dict, ModuleState* state) {
+  for (int i = 0; i < kLineTypeCount; i++) {
+    PyObject* constant = PyBytes_FromString(kLineTypeRows[i].fDescription);
+    if (!constant) return -1;
+    state->fLineTypes[i] = constant;  // fType hands out this very object
+    if (PyDict_SetItemString(dict, kLineTypeRows[i].fName, constant) != 0) return -1;
   }
   return 0;
 }
@@ -80,10 +85,11 @@ int AddAttribKinds(PyObject* dict) {
 
 }  // namespace
 
-int AddModuleConstants(PyObject* dict) {
-  if (AddLineTypes(dict) != 0 || AddAttribKinds(dict) != 0) return -1;
-  if (PyDict_SetItemString(dict, "LogicalLineType", reinterpret_cast<PyObject*>(&LogicalLineType)) != 0)
-    return -1;
+int AddModuleConstants(PyObject* module, ModuleState* state) {
+  PyObject* dict = PyModule_GetDict(module);  // borrowed; a module always has one
+  if (AddLineTypes(dict, state) != 0 || AddAttribKinds(dict) != 0) return -1;
+  PyObject* lineType = reinterpret_cast<PyObject*>(state->fShared->fLineType);
+  if (PyDict_SetItemString(dict, "LogicalLineType", lineType) != 0) return -1;
   PyRef comment = PyRef::Steal(PyLong_FromLong(COMMENT_TOKEN));
   if (!comment || PyDict_SetItemString(dict, "COMMENT_TOKEN", comment.Get()) != 0) return -1;
   PyRef newest = PyRef::Steal(NewestFeatureVersion());

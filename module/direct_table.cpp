@@ -5,22 +5,32 @@
 
 #include "module/direct_table.h"
 
+#include "core/py_ref.h"
 #include "lines/editing.h"
 #include "lines/line_type.h"
 #include "lines/logical_line.h"
 #include "logicalline_direct.h"
 #include "module/line_surface.h"
+#include "module/module_state.h"
 #include "tokenizer/token_queries.h"
 
 namespace {
 
-PyObject* CreateEmptyLogical() { return reinterpret_cast<PyObject*>(NewLogicalLine(0)); }
+// The entries that make a line or hand out its type take the calling interpreter's type: the
+// table is the same in every interpreter, and its callers name no module.
+PyObject* CreateEmptyLogical() {
+  PyRef module = PyRef::Steal(CurrentModule());  // held while the line is made
+  if (!module) return nullptr;
+  PyTypeObject* type = StateOf(module.Get())->fShared->fLineType;
+  return reinterpret_cast<PyObject*>(NewLogicalLine(type, 0));
+}
 
-int IsLogical(PyObject* object) { return Py_TYPE(object) == &LogicalLineType; }
+int IsLogical(PyObject* object) { return IsLogicalLine(object); }
 
 PyObject* GetLogicalTypeObject() {
-  Py_INCREF(&LogicalLineType);
-  return reinterpret_cast<PyObject*>(&LogicalLineType);
+  PyRef module = PyRef::Steal(CurrentModule());
+  if (!module) return nullptr;
+  return Py_NewRef(reinterpret_cast<PyObject*>(StateOf(module.Get())->fShared->fLineType));
 }
 
 PyObject* GetArgName(PyObject* object, int index) {

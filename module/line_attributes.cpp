@@ -7,8 +7,8 @@
 
 #include "core/py_ref.h"
 #include "lines/tokens_tuple.h"
-#include "module/constants.h"
 #include "module/line_surface.h"
+#include "module/module_state.h"
 
 namespace {
 
@@ -42,7 +42,7 @@ PyObject* ObjectOrNone(PyObject* object) {
 // Getters, in attribute table order.
 
 PyObject* GetType(PyObject* self, void*) {
-  PyObject* constant = LineTypeTable[AsLine(self)->fType].fObject;
+  PyObject* constant = StateOfType(Py_TYPE(self))->fLineTypes[AsLine(self)->fType];
   Py_INCREF(constant);
   return constant;
 }
@@ -70,7 +70,10 @@ PyObject* GetBaseClassNames(PyObject* self, void*) {
 PyObject* GetLocalScopeName(PyObject* self, void*) {
   return ObjectOrNone(AsLine(self)->fLocalScopeName);
 }
-PyObject* GetTokens(PyObject* self, void*) { return TokensTupleOf(AsLine(self)); }
+PyObject* GetTokens(PyObject* self, void*) {
+  const LineState* shared = StateOfType(Py_TYPE(self))->fShared;
+  return TokensTupleOf(shared->fEntries, shared->fTokenTexts, AsLine(self));
+}
 PyObject* GetLineText(PyObject* self, void*) {
   const char* text = AsLine(self)->fLineText;
   if (!text) Py_RETURN_NONE;

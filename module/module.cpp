@@ -1,17 +1,18 @@
-// The module: its functions, their table, and initialisation. State lives in process-wide
-// variables (the line type constants, the create hook, and the tables that reads share), so the
-// module is initialised once per process.
+// The module: its functions, their table, and initialisation. Each interpreter that imports it
+// gets a module of its own, whose state holds everything the module makes: its types, its
+// constants, the create hook and the tables that reads share.
 #define PY_SSIZE_T_CLEAN
 #include <Python.h>
 
 #include "lines/construction.h"
-#include "lines/logical_line.h"
+#include "lines/line_state.h"
 #include "lines/tokens_tuple.h"
 #include "logicalline_direct.h"
 #include "module/constants.h"
 #include "module/direct_table.h"
 #include "module/line_surface.h"
 #include "module/method_cast.h"
+#include "module/module_state.h"
 #include "module/parser.h"
 #include "tokenizer/code_units.h"
 #include "tokenizer/operator_table.h"
@@ -38,7 +39,7 @@ PyDoc_STRVAR(kCreateLogicalLineParserDoc,
              "          ast.parse takes it: strings are read as that version of \n"
              "          Python reads them, f-strings with nested fields from (3, 12), \n"
              "          t-strings from (3, 14); by default as Python 3.10 does");
-PyObject* CreateLogicalLineParser(PyObject*, PyObject* args, PyObject* kwargs) {
+PyObject* CreateLogicalLineParser(PyObject* module, PyObject* args, PyObject* kwargs) {
   static const char* keywords[] = {"copy_strings", "skip_whitespace_lines", "remove_comments",
                                    "include_line_text", "feature_version", nullptr};
   PyObject* copyStrings = Py_True;
@@ -50,8 +51,8 @@ PyObject* CreateLogicalLineParser(PyObject*, PyObject* args, PyObject* kwargs) {
                                    &copyStrings, &skipWhitespaceLines, &removeComments,
                                    &includeLineText, &featureVersion))
     return nullptr;
-  return NewParser(copyStrings, skipWhitespaceLines, removeComments, includeLineText,
-                   featureVersion);
+  return NewParser(StateOf(module), copyStrings, skipWhitespaceLines, removeComments,
+                   includeLineText, featureVersion);
 }
 
 PyDoc_STRVAR(kGetDirectLogicalLineFunctionTableDoc,
@@ -79,22 +80,20 @@ PyObject* GetFirstCodeUnit(PyObject*, PyObject* args) {
   return PyUnicode_FromKindAndData(PyUnicode_4BYTE_KIND, &unit, 1);
 }
 
-PyObject* SetLogicalCreateFunction(PyObject*, PyObject* args) {
+PyObject* SetLogicalCreateFunction(PyObject* module, PyObject* args) {
   PyObject* hook = nullptr;
   if (!PyArg_ParseTuple(args, "O", &hook)) return nullptr;
-  SetCreateHook(hook);
+  SetCreateHook(StateOf(module)->fShared, hook);
   Py_RETURN_NONE;
 }
 
 PyDoc_STRVAR(kReleaseSharedTablesDoc,
              "Empty the tables of token texts and fTokens entries that reads share, as when the "
              "module is freed.  For leak checks: what reading holds can then be counted.");
-PyObject* ReleaseSharedTablesFunction(PyObject*, PyObject*) {
-  ReleaseSharedTables();
+PyObject* ReleaseSharedTablesFunction(PyObject* module, PyObject*) {
+  ReleaseSharedTables(StateOf(module)->fShared);
   Py_RETURN_NONE;
 }
-
-void FreeModule(void*) { ReleaseSharedTables(); }
 
 PyMethodDef kModuleFunctions[] = {
     {"CreateLogicalLineParser", AsMethod(CreateLogicalLineParser), METH_VARARGS | METH_KEYWORDS,
@@ -108,23 +107,51 @@ PyMethodDef kModuleFunctions[] = {
     {nullptr, nullptr, 0, nullptr},
 };
 
-// The tables are released when the module is freed, if the interpreter frees it.
+// Makes everything the state holds, then publishes the constants. Returns 0, or -1 with an
+// exception set.
+int FillModule(PyObject* module) {
+  ModuleState* state = StateOf(module);
+  state->fShared = NewLineState(module, kLineMethods, kLineAttributes);
+  if (!state->fShared) return -1;
+  state->fParserType = NewParserType(module);
+  if (!state->fParserType || AddModuleConstants(module, state) != 0) return -1;
+  return MakeCurrent(module) == 0 && DropCreateHookAtExit(module) == 0 ? 0 : -1;
+}
+
+// A failure ends the process: there is no partly initialised module.
+int ExecModule(PyObject* module) {
+  if (FillModule(module) != 0 || PyErr_Occurred())
+    _Py_FatalErrorFunc("PyInit_logicalline", "can't initialize logicalline module.");
+  return 0;
+}
+
+int TraverseModule(PyObject* module, visitproc visit, void* arg) {
+  return VisitState(StateOf(module), visit, arg);
+}
+
+int ClearModule(PyObject* module) {
+  ClearState(StateOf(module));
+  return 0;
+}
+
+void FreeModule(void* module) { FreeState(StateOf(static_cast<PyObject*>(module))); }
+
+// Every interpreter may import the module, even one with a lock of its own: all that an import
+// makes is its own. No Py_mod_gil slot: a build without the lock takes it back on import, since
+// the state has not been shown safe without it.
+PyModuleDef_Slot kModuleSlots[] = {
+    {Py_mod_exec, reinterpret_cast<void*>(ExecModule)},
+#ifdef Py_mod_multiple_interpreters
+    {Py_mod_multiple_interpreters, Py_MOD_PER_INTERPRETER_GIL_SUPPORTED},
+#endif
+    {0, nullptr},
+};
+
 PyModuleDef kModuleDef = {
-    PyModuleDef_HEAD_INIT, "logicalline", nullptr, -1, kModuleFunctions,
-    nullptr, nullptr, nullptr, FreeModule,
+    PyModuleDef_HEAD_INIT, "logicalline", nullptr, sizeof(ModuleState), kModuleFunctions,
+    kModuleSlots, TraverseModule, ClearModule, FreeModule,
 };
 
 }  // namespace
 
-PyMODINIT_FUNC PyInit_logicalline() {
-  LogicalLineType.tp_methods = kLineMethods;
-  LogicalLineType.tp_getset = kLineAttributes;
-  if (PyType_Ready(&LogicalLineType) < 0 || PyType_Ready(&LogicalLineParserType) < 0)
-    Py_FatalError("can't initialize logicalline module.");
-  PyObject* module = PyModule_Create2(&kModuleDef, 1013);
-  if (!module || PyErr_Occurred()) Py_FatalError("can't initialize logicalline module.");
-  PyObject* dict = PyModule_GetDict(module);
-  if (PyErr_Occurred() || AddModuleConstants(dict) != 0)
-    Py_FatalError("can't initialize logicalline module.");
-  return module;
-}
+PyMODINIT_FUNC PyInit_logicalline() { return PyModuleDef_Init(&kModuleDef); }

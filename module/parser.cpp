@@ -4,12 +4,17 @@
 
 #include "module/parser.h"
 
+#include "core/module_type.h"
 #include "module/reading_loop.h"
 #include "module/update.h"
 
 namespace {
 
-void ParserDealloc(PyObject* self) { Py_TYPE(self)->tp_free(self); }
+void ParserDealloc(PyObject* self) {
+  PyTypeObject* type = Py_TYPE(self);
+  type->tp_free(self);
+  Py_DECREF(type);  // a heap type, which the parser holds
+}
 
 // Stores the truth value of `option`; returns -1 when its truth test raises.
 int StoreTruth(PyObject* option, int* field) {
@@ -80,23 +85,28 @@ PyMethodDef kParserMethods[] = {
 
 }  // namespace
 
-// Slots left out stay empty; the interpreter fills them in when the type is readied.
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wmissing-field-initializers"
-PyTypeObject LogicalLineParserType = {
-    .ob_base = PyVarObject_HEAD_INIT(nullptr, 0)
-    .tp_name = "LogicalLineParser",
-    .tp_basicsize = sizeof(LogicalLineParser),
-    .tp_dealloc = ParserDealloc,
-    .tp_flags = Py_TPFLAGS_DEFAULT,  // no subclassing, no collector, no constructor
-    .tp_methods = kParserMethods,
-};
-#pragma GCC diagnostic pop
+PyTypeObject* NewParserType(PyObject* module) {
+  PyType_Slot slots[] = {
+      {Py_tp_dealloc, reinterpret_cast<void*>(ParserDealloc)},
+      {Py_tp_methods, kParserMethods},
+      {0, nullptr},
+  };
+  // No subclassing, no collector, no constructor, no attribute of its own set from Python.
+  PyType_Spec spec = {
+      .name = "logicalline.LogicalLineParser",
+      .basicsize = sizeof(LogicalLineParser),
+      .itemsize = 0,
+      .flags = Py_TPFLAGS_DEFAULT | Py_TPFLAGS_DISALLOW_INSTANTIATION | Py_TPFLAGS_IMMUTABLETYPE,
+      .slots = slots,
+  };
+  return NewModuleType(module, &spec);
+}
 
-PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObject* removeComments,
-                    PyObject* includeLineText, PyObject* featureVersion) {
-  LogicalLineParser* parser = PyObject_New(LogicalLineParser, &LogicalLineParserType);
+PyObject* NewParser(ModuleState* state, PyObject* copyStrings, PyObject* skipWhitespaceLines,
+                    PyObject* removeComments, PyObject* includeLineText, PyObject* featureVersion) {
+  LogicalLineParser* parser = PyObject_New(LogicalLineParser, state->fParserType);
   if (!parser) return nullptr;
+  parser->fShared = state->fShared;
   parser->fOperatorTable = &kOperatorTable;
   if (StoreTruth(skipWhitespaceLines, &parser->fSkipWhitespaceLines) != 0 ||
       StoreTruth(removeComments, &parser->fRemoveComments) != 0 ||
@@ -112,6 +122,7 @@ PyObject* NewParser(PyObject* copyStrings, PyObject* skipWhitespaceLines, PyObje
 ReadOptions ParserOptions(PyObject* self) {
   const LogicalLineParser* parser = reinterpret_cast<const LogicalLineParser*>(self);
   return ReadOptions{.fOperatorTable = parser->fOperatorTable,
+                     .fTokenTexts = parser->fShared->fTokenTexts,
                      .fCopyStrings = parser->fCopyStrings != 0,
                      .fSkipWhitespaceLines = parser->fSkipWhitespaceLines != 0,
                      .fRemoveComments = parser->fRemoveComments != 0,

@@ -22,12 +22,13 @@ PyObject* ReadSource(PyObject* self, PyObject* readline, const char* data, const
     PyErr_SetString(PyExc_ValueError, "line count must be >= 0, or -1 for no limit");
     return nullptr;
   }
-  return ReadLineList(ParserOptions(self), LineSource{.fReadline = readline,
-                                                      .fData = data,
-                                                      .fDataEnd = dataEnd,
-                                                      .fDataOwner = owner,
-                                                      .fFirstLine = firstLine,
-                                                      .fLineCount = lineCount});
+  return ReadLineList(ParserShared(self), ParserOptions(self),
+                      LineSource{.fReadline = readline,
+                                 .fData = data,
+                                 .fDataEnd = dataEnd,
+                                 .fDataOwner = owner,
+                                 .fFirstLine = firstLine,
+                                 .fLineCount = lineCount});
 }
 
 PyDoc_STRVAR(kGetLogicalLineListDoc,

@@ -11,6 +11,21 @@
 
 namespace {
 
+// The update must find the list as it left it at every step, so no host code may run inside
+// it, and it calls none. Before 3.12, though, an allocation can itself start a collection,
+// which may run a host's finalizer that changes the list: there the collector is held off for
+// the update. From 3.12 on, an allocation only schedules a collection, which runs when Python
+// code next runs or signals are checked, and the update does neither; the collector of the
+// interpreter is then left alone.
+struct CollectorPause {
+#if PY_VERSION_HEX < 0x030C0000
+  const int fWasEnabled = PyGC_Disable();
+  ~CollectorPause() {
+    if (fWasEnabled) PyGC_Enable();
+  }
+#endif
+};
+
 PyDoc_STRVAR(kUpdateLogicalLineListDoc,
              "Update a list of logical lines after an edit of the text it was read from.  "
              "Arguments: the list (read by a parser with this one's options from line 0, maybe "
@@ -46,7 +61,7 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
                  given);
     return nullptr;
   }
-  if (HasCreateHook()) {
+  if (HasCreateHook(ParserShared(self))) {
     PyErr_SetString(PyExc_TypeError,
                     "UpdateLogicalLineList needs the module's own lines, and a create hook is "
                     "installed");
@@ -57,14 +72,10 @@ PyObject* UpdateLogicalLineList(PyObject* self, PyObject* args) {
     return nullptr;
   }
   const Edit told{.fFirst = first, .fOldCount = oldCount, .fNewCount = newCount};
-  // Reading allocates, and an allocation may set off a collection, which may run a host's
-  // finalizer that changes the list under the update; the collector waits until it is done.
-  const int collecting = PyGC_Disable();
+  [[maybe_unused]] const CollectorPause pause;
   const char* data = static_cast<const char*>(view.buf);
-  PyObject* result = UpdateLineList(ParserOptions(self), lines, given == 5 ? &told : nullptr,
-                                    data, data + view.len, view.obj);
-  if (collecting) PyGC_Enable();
-  return result;
+  return UpdateLineList(ParserShared(self), ParserOptions(self), lines,
+                        given == 5 ? &told : nullptr, data, data + view.len, view.obj);
 }
 
 }  // namespace

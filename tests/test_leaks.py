@@ -148,6 +148,16 @@ def test_operation_leaks_nothing(operation):  # in a fresh interpreter, clear of
     assert done.returncode == 0, done.stderr
 
 
+@pytest.mark.skipif(sys.version_info < (3, 13), reason="the checks call the native table "
+                    "through ctypes, which an isolated interpreter imports from Python 3.13")
+@pytest.mark.parametrize("operation", ["parsing", "methods_and_entries"])
+def test_operation_leaks_nothing_inside_an_isolated_interpreter(operation):
+    done = run_isolated("import test_subinterpreters as s\n"
+                        "with s.interpreter() as run:\n"
+                        f"    run('import test_leaks as t; t.assert_no_growth(t.{operation})')\n")
+    assert done.returncode == 0, done.stderr
+
+
 def leaking_16_bytes():
     parsing()
     LIBC.malloc(16)
