@@ -12,6 +12,7 @@
 #include <cstdint>
 
 #include "assembly/line_parts.h"
+#include "core/raw_bytes.h"
 #include "core/text_buffer.h"
 #include "core/token_position.h"
 #include "tokenizer/formatted_string.h"
@@ -33,9 +34,10 @@ struct SourceLines {
   TextBuffer fText;      // every physical line read for the logical line, line breaks included
   // A copy of the whole text that readline hands out, for a list that updates keep; null when
   // none is wanted, and never for a buffer, which is its own copy.
-  TextBuffer* fKept;
-  int fKeptOpen;    // 1 when the last piece kept ends without a line feed
-  int fCutAtFeeds;  // 1 while every piece kept is one line, cut as BytesIO.readline cuts it
+  RawBytes* fKept;
+  int fKeptOpen;        // 1 when the last piece kept ends without a line feed
+  int fCutAtFeeds;      // 1 while every piece kept but the last ends at a line feed
+  int64_t fKeptPieces;  // pieces kept: the lines of the text when no piece holds two
 };
 
 constexpr int kInlineLineStarts = 8;

@@ -55,16 +55,17 @@ int NextPhysicalLine(SourceLines* source, PyRef* line, const char** bytes, Py_ss
   return 0;
 }
 
-// Copies a piece that readline handed out to the kept text, if one is kept. A piece is a line
-// as BytesIO.readline cuts one when it ends at its only line feed, or is the last. Returns 0, or
-// -1 with MemoryError set.
+// Copies a piece that readline handed out to the kept text, if one is kept, and counts it. A
+// piece is one line as BytesIO.readline cuts one when it ends at its only line feed, or is the
+// last; the last byte tells the first half here, and the count of the pieces the second, once
+// the text is whole. Returns 0, or -1 with MemoryError set.
 int KeepPiece(SourceLines* source, const char* bytes, Py_ssize_t size) {
   if (!source->fKept || size == 0) return 0;
   const auto n = static_cast<size_t>(size);
-  const void* feed = memchr(bytes, '\n', n);
-  if (source->fKeptOpen || (feed && feed != bytes + n - 1)) source->fCutAtFeeds = 0;
-  source->fKeptOpen = feed == nullptr;
-  if (AppendBytes(source->fKept, bytes, n) != 0) {
+  if (source->fKeptOpen) source->fCutAtFeeds = 0;
+  source->fKeptOpen = bytes[n - 1] != '\n';
+  source->fKeptPieces++;
+  if (AppendRawBytes(source->fKept, bytes, n) != 0) {
     PyErr_NoMemory();
     return -1;
   }
@@ -88,9 +89,10 @@ void InitReadlineSource(SourceLines* source, PyObject* readline) {
   source->fKept = nullptr;
   source->fKeptOpen = 0;
   source->fCutAtFeeds = 1;
+  source->fKeptPieces = 0;
 }
 
-void KeepSourceText(SourceLines* source, TextBuffer* kept) { source->fKept = kept; }
+void KeepSourceText(SourceLines* source, RawBytes* kept) { source->fKept = kept; }
 
 void InitBufferSource(SourceLines* source, const char* data, const char* from,
                       const char* dataEnd, bool whole) {

@@ -15,12 +15,16 @@ void InitReadlineSource(SourceLines* source, PyObject* readline);
 void InitBufferSource(SourceLines* source, const char* data, const char* from,
                       const char* dataEnd, bool whole);
 
-// From now on, appends every piece that readline hands out to `kept` as well, and notes whether
-// the pieces are the text cut into lines as BytesIO.readline cuts it.
-void KeepSourceText(SourceLines* source, TextBuffer* kept);
+// From now on, appends every piece that readline hands out to `kept` as well, and counts the
+// pieces and notes whether each ends at a line feed.
+void KeepSourceText(SourceLines* source, RawBytes* kept);
 
-// True when the text kept so far was handed out as BytesIO.readline cuts it into lines.
-inline bool KeptTextIsCutAtFeeds(const SourceLines* source) { return source->fCutAtFeeds != 0; }
+// The pieces that readline handed out and were kept, when each of them but the last ends at a
+// line feed; -1 otherwise. The text was handed out as BytesIO.readline cuts it into lines when
+// it has that many lines: no piece then holds a line feed before its end.
+inline int64_t KeptPiecesCutAtFeeds(const SourceLines* source) {
+  return source->fCutAtFeeds ? source->fKeptPieces : -1;
+}
 
 // Frees the text and the pending line.
 void ReleaseSource(SourceLines* source);

@@ -9,7 +9,7 @@
 #include "assembly/source_reader.h"
 #include "assembly/token_list.h"
 #include "core/py_ref.h"
-#include "core/text_buffer.h"
+#include "core/raw_bytes.h"
 #include "lines/construction.h"
 #include "lines/logical_line.h"
 #include "lines/numbering.h"
@@ -44,18 +44,21 @@ int ReadLines(LineState* shared, ReadingState* state, int64_t stop, PyObject* li
 }
 
 // Records the list that a whole read numbered with `table`, with the text it was read from:
-// the buffer, or a copy of what readline handed out. Lines that readline cut otherwise than a
-// buffer is cut are numbered unlike a read of their text: their list is not recorded, and an
-// update refuses it. Returns 0, or -1 with an exception set.
+// the buffer, or what readline handed out. Lines that readline cut otherwise than a buffer is
+// cut are numbered unlike a read of their text: their list is not recorded, or, where that is
+// not known yet, the first update counts the lines and refuses it. Returns 0, or -1 with an
+// exception set.
 int SealRead(ShiftTable* table, PyObject* list, const ReadOptions& options,
-             const LineSource& source, const SourceLines& read, const TextBuffer& kept) {
-  if (source.fReadline && !KeptTextIsCutAtFeeds(&read)) return 0;
-  PyRef text = PyRef::Steal(
-      source.fReadline
-          ? PyBytes_FromStringAndSize(kept.fData, static_cast<Py_ssize_t>(kept.fLength))
-          : TextToKeep(source.fDataOwner, source.fData, source.fDataEnd));
-  if (!text) return -1;
-  return SealNumbering(table, list, text.Get(), options);
+             const LineSource& source, const SourceLines& read, RawBytes* kept) {
+  const int64_t pieces = source.fReadline ? KeptPiecesCutAtFeeds(&read) : -1;
+  if (source.fReadline && pieces < 0) return 0;
+  KeptText text{};
+  if ((source.fReadline ? KeepCollectedText(kept, &text)
+                        : KeepText(source.fDataOwner, source.fData, source.fDataEnd, &text)) != 0)
+    return -1;
+  const int status = SealNumbering(table, list, &text, options, pieces);
+  ReleaseKeptText(&text);  // left empty when the table took it
+  return status;
 }
 
 }  // namespace
@@ -76,8 +79,8 @@ PyObject* ReadLineList(LineState* shared, const ReadOptions& options, const Line
   // A whole read is numbered as it is built, so that the first update of the list need not
   // walk it; a window cannot be updated, and a hook's lines are not ours.
   ShiftTable* table = nullptr;
-  TextBuffer kept;
-  InitTextBuffer(&kept);
+  RawBytes kept;
+  InitRawBytes(&kept);
   if (source.fFirstLine == 0 && whole && !HasCreateHook(shared)) {
     table = NewShiftTable();
     if (!table) {
@@ -89,9 +92,9 @@ PyObject* ReadLineList(LineState* shared, const ReadOptions& options, const Line
   ShiftTable* numbering = table;  // cleared when a hook takes over
   int status = ReadLines(shared, &state, stop, list.Get(), &numbering);
   if (status == 0 && numbering)
-    status = SealRead(numbering, list.Get(), options, source, state.fSource, kept);
+    status = SealRead(numbering, list.Get(), options, source, state.fSource, &kept);
   ReleaseReadingState(&state);
-  ResetTextBuffer(&kept);
+  ReleaseRawBytes(&kept);
   if (table) DropShiftTable(table);
   return status == 0 ? list.Release() : nullptr;
 }

@@ -50,10 +50,7 @@ LogicalLine* LineAt(PyObject* lines, Py_ssize_t i) { return AsLine(PyList_GET_IT
 int64_t EndOf(const LogicalLine* line) { return FirstLineOf(line) + line->fLineCount; }
 
 // The text a table records; empty for the new table of an empty list.
-std::string_view RecordedText(const ShiftTable* table) {
-  if (!table->fText) return {};
-  return {PyBytes_AS_STRING(table->fText), static_cast<size_t>(PyBytes_GET_SIZE(table->fText))};
-}
+std::string_view RecordedText(const ShiftTable* table) { return table->fText.View(); }
 
 // Returns the index of the first line that starts at or after physical line `number`.
 Py_ssize_t FirstLineFrom(PyObject* lines, int64_t number) {
@@ -117,10 +114,19 @@ ShiftTable* RecordOf(PyObject* lines) {
 
 // Refuses a list that is not exactly as the last read or update left it, or that was read with
 // other options. Returns 0, or -1 with ValueError set.
-int CheckRecord(const ShiftTable* table, PyObject* lines, const ReadOptions& options) {
+int CheckRecord(ShiftTable* table, PyObject* lines, const ReadOptions& options) {
   // Nothing short of reading the text again would prove that a changed list still fits it.
   if (!table || !ListIsAsNumbered(table, lines)) return Refuse(kChangedList);
   if (!(table->fOptions == options)) return Refuse(kOtherOptions);
+  // A readline that handed out two lines in one piece numbered them as one: such a list never
+  // fits its text, and is refused from now on.
+  if (table->fUnprovenLines >= 0) {
+    if (CountLines(RecordedText(table)) != table->fUnprovenLines) {
+      table->fStale = true;
+      return Refuse(kChangedList);
+    }
+    table->fUnprovenLines = -1;
+  }
   return 0;
 }
 
@@ -173,10 +179,7 @@ int EditOf(PyObject* lines, std::string_view old, std::string_view next, const E
 // Numbers the list's lines afresh in a new table, regrouped in order, with the record of the
 // old one. Returns the table, with the caller's hold, or nullptr with MemoryError set and the
 // lines as they were.
-ShiftTable* Regroup(PyObject* lines, const ShiftTable* old) {
-  // Taken before the lines leave the old table, which the last of them frees.
-  PyRef text = PyRef::FromBorrowed(old->fText);
-  const ReadOptions options = old->fOptions;
+ShiftTable* Regroup(PyObject* lines, ShiftTable* old) {
   const auto size = static_cast<size_t>(PyList_GET_SIZE(lines));
   ShiftTable* table = NewShiftTable();
   // Every allocation first: a failure then leaves the lines in the numbering they share.
@@ -186,9 +189,13 @@ ShiftTable* Regroup(PyObject* lines, const ShiftTable* old) {
     PyErr_NoMemory();
     return nullptr;
   }
+  // Taken before the lines leave the old table, which the last of them frees.
+  KeptText text = old->fText;
+  old->fText = KeptText{};
+  const ReadOptions options = old->fOptions;
   for (size_t i = 0; i < size; i++)
     NumberLine(table, AsLine(PyList_GET_ITEM(lines, i)), i);  // cannot fail: room is reserved
-  SealNumbering(table, lines, text.Get(), options);           // cannot fail either
+  SealNumbering(table, lines, &text, options, -1);            // cannot fail either
   return table;
 }
 
@@ -335,19 +342,22 @@ PyObject* UpdateNumbered(const LineState* shared, const ReadOptions& options, Py
   const Py_ssize_t count = PyList_GET_SIZE(added.Get());
   PyRef result = PyRef::Steal(Py_BuildValue("nnO", index, kept - index, added.Get()));
   if (!result) return nullptr;
-  PyRef text = PyRef::Steal(TextToKeep(owner, data, end));
-  if (!text) return nullptr;
   if (ReserveGroups(table, ReservedGroups(count)) != 0 ||
       ReserveItems(table, static_cast<size_t>(size - (kept - index) + count)) != 0)
     return PyErr_NoMemory();
+  KeptText text{};
+  if (KeepText(owner, data, end, &text) != 0) return nullptr;
   // The old lines stay alive until the list is renumbered: releasing them may run a host's
   // code, which must find the list whole.
   PyRef removed = PyRef::Steal(PyList_GetSlice(lines, index, kept));
-  if (!removed || PyList_SetSlice(lines, index, kept, added.Get()) != 0) return nullptr;
+  if (!removed || PyList_SetSlice(lines, index, kept, added.Get()) != 0) {
+    ReleaseKeptText(&text);
+    return nullptr;
+  }
   for (Py_ssize_t i = 0; i < kept - index; i++) DetachLine(LineAt(removed.Get(), i));
   Renumber(lines, table, index, count, edit.Delta(), byteDelta);
   SealReplacedLines(table, lines, static_cast<size_t>(index), static_cast<size_t>(kept - index),
-                    static_cast<size_t>(count), text.Get(), options);
+                    static_cast<size_t>(count), &text, options);
   return result.Release();
 }
 

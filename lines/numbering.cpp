@@ -20,34 +20,27 @@ int NumberLine(ShiftTable* table, LogicalLine* line, size_t index) {
     }
     InsertGroup(table, table->fCount);
   }
-  DetachLine(line);
+  if (line->fShiftTable) DetachLine(line);  // a line a full read just built shares none
   AttachLine(line, table, table->fOrder[table->fCount - 1]);
   return 0;
 }
 
-PyObject* TextToKeep(PyObject* owner, const char* data, const char* end) {
-  const Py_ssize_t length = end - data;
-  if (owner && PyBytes_CheckExact(owner) && PyBytes_AS_STRING(owner) == data &&
-      PyBytes_GET_SIZE(owner) == length)
-    return Py_NewRef(owner);
-  return PyBytes_FromStringAndSize(data, length);
-}
-
-int SealNumbering(ShiftTable* table, PyObject* list, PyObject* text, const ReadOptions& options) {
+int SealNumbering(ShiftTable* table, PyObject* list, KeptText* text, const ReadOptions& options,
+                  int64_t unprovenLines) {
   const auto count = static_cast<size_t>(PyList_GET_SIZE(list));
   if (ReserveItems(table, count) != 0) {
     PyErr_NoMemory();
     return -1;
   }
   RecordItems(table, list, 0, table->fItemCount, ItemsOf(list), count);
-  RecordText(table, text, options);
+  RecordText(table, text, options, unprovenLines);
   return 0;
 }
 
 void SealReplacedLines(ShiftTable* table, PyObject* list, size_t index, size_t removed,
-                       size_t added, PyObject* text, const ReadOptions& options) {
+                       size_t added, KeptText* text, const ReadOptions& options) {
   RecordItems(table, list, index, removed, ItemsOf(list) + index, added);
-  RecordText(table, text, options);
+  RecordText(table, text, options, -1);
 }
 
 bool ListIsAsNumbered(const ShiftTable* table, PyObject* list) {

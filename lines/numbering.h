@@ -19,20 +19,17 @@ constexpr size_t kGroupLines = 32;
 // table it shared. Returns 0, or -1 with MemoryError set and the line unchanged.
 int NumberLine(ShiftTable* table, LogicalLine* line, size_t index);
 
-// Returns a new reference to a bytes object that holds [data, end) for a list's record: the
-// owner itself when it is exactly such a bytes object, which cannot change, else a copy; nullptr
-// with MemoryError set.
-PyObject* TextToKeep(PyObject* owner, const char* data, const char* end);
-
-// Records the list that `table` numbers, as it stands now, and the text (a bytes object) and
-// options it was read with. Returns 0, or -1 with MemoryError set.
-int SealNumbering(ShiftTable* table, PyObject* list, PyObject* text, const ReadOptions& options);
+// Records the list that `table` numbers, as it stands now, and the text (taken over, leaving
+// *text empty on success) and options it was read with; `unprovenLines` as RecordText takes
+// it. Returns 0, or -1 with MemoryError set.
+int SealNumbering(ShiftTable* table, PyObject* list, KeptText* text, const ReadOptions& options,
+                  int64_t unprovenLines);
 
 // Records that the list's slice from `index` on, `removed` lines, became the `added` lines that
-// the list now holds there, and that the list now stands for `text`, read with `options`. Room
-// for the list's new length must have been reserved.
+// the list now holds there, and that the list now stands for `text` (taken over), read with
+// `options`. Room for the list's new length must have been reserved.
 void SealReplacedLines(ShiftTable* table, PyObject* list, size_t index, size_t removed,
-                       size_t added, PyObject* text, const ReadOptions& options);
+                       size_t added, KeptText* text, const ReadOptions& options);
 
 // True when the list is the one the table recorded and holds exactly the lines recorded for it,
 // in that order, and none of them has left the numbering since.

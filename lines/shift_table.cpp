@@ -15,7 +15,8 @@ ShiftTable* NewShiftTable() {
   *table = ShiftTable{.fRefs = 1, .fGroups = nullptr, .fOrder = nullptr, .fCount = 0,
                       .fGroupCapacity = 0, .fOrderCapacity = 0, .fList = nullptr,
                       .fItems = nullptr, .fItemCount = 0, .fItemCapacity = 0, .fStale = false,
-                      .fText = nullptr, .fOptions = {}};
+                      .fText = {}, .fOptions = {},
+                      .fUnprovenLines = -1};
   return table;
 }
 
@@ -26,7 +27,7 @@ void DropShiftTable(ShiftTable* table) {
   free(table->fGroups);
   free(table->fOrder);
   free(table->fItems);
-  Py_XDECREF(table->fText);
+  ReleaseKeptText(&table->fText);
   free(table);
 }
 
@@ -73,11 +74,13 @@ void RecordItems(ShiftTable* table, const void* list, size_t index, size_t remov
   table->fStale = false;
 }
 
-void RecordText(ShiftTable* table, PyObject* text, const ReadOptions& options) {
-  PyObject* old = table->fText;
-  table->fText = Py_NewRef(text);
+void RecordText(ShiftTable* table, KeptText* text, const ReadOptions& options,
+                int64_t unprovenLines) {
+  ReleaseKeptText(&table->fText);
+  table->fText = *text;
+  *text = KeptText{};
   table->fOptions = options;
-  Py_XDECREF(old);  // a bytes object: its release runs no code of the host's
+  table->fUnprovenLines = unprovenLines;
 }
 
 bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,

@@ -13,6 +13,7 @@
 #include <cstdint>
 
 #include "assembly/line_parts.h"
+#include "lines/kept_text.h"
 
 struct ShiftGroup {
   int64_t fLineShift;  // added to the first line that each member stores
@@ -40,10 +41,15 @@ struct ShiftTable {
   size_t fItemCapacity;
   bool fStale;
   // What the list was read from, so that an update can prove the host's description of an
-  // edit and read the new text as the list was read: the whole text as a bytes object (owned),
-  // null until the list is recorded; and the reading options.
-  PyObject* fText;
+  // edit and read the new text as the list was read: the whole text, empty until the list is
+  // recorded, and the reading options.
+  KeptText fText;
   ReadOptions fOptions;
+  // For a text that readline handed out piece by piece, each piece ending at a line feed but
+  // the last: how many pieces there were. The lines are numbered as a buffer's only when no
+  // piece holds another line feed, that is when the text has as many lines. The first update
+  // counts them, once; -1 when there is nothing left to prove.
+  int64_t fUnprovenLines;
 };
 
 // A new empty table with one hold, or nullptr when memory is short (no exception set).
@@ -75,9 +81,10 @@ int ReserveItems(ShiftTable* table, size_t count);
 void RecordItems(ShiftTable* table, const void* list, size_t index, size_t removed,
                  const void* const* items, size_t added);
 
-// Records the text the list now stands for, a bytes object that the table takes a reference to,
-// and the options it was read with.
-void RecordText(ShiftTable* table, PyObject* text, const ReadOptions& options);
+// Records the text the list now stands for, which the table takes over (leaving *text empty),
+// the options it was read with, and the pieces still to prove it cut into (-1: none).
+void RecordText(ShiftTable* table, KeptText* text, const ReadOptions& options,
+                int64_t unprovenLines);
 
 // True when the list and its items are those recorded and no line has left the numbering since.
 bool ItemsAreRecorded(const ShiftTable* table, const void* list, const void* const* items,
