@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
-# Builds a wheel for each of Python 3.10 to 3.13 (or the interpreters named), repaired by auditwheel into a manylinux tag that
-# a package index accepts, and an sdist, all into dist/. Each is installed into a fresh virtual
+# Builds a wheel for each of Python 3.10 to 3.13 (or the interpreters named; 3.14 and 3.15 run
+# in .ci/sidroot.sh's root), repaired by auditwheel into a manylinux tag that a package index
+# accepts, and an sdist, all into dist/. Each is installed into a fresh virtual
 # environment with the test extras and the suite runs against it: the wheels from the repository
 # root, the sdist from its own unpacked tree, which shows that it carries what the tests read.
 # Each must carry the licence (tools/check_licence.py).

@@ -36,9 +36,10 @@ PyDoc_STRVAR(kCreateLogicalLineParserDoc,
              "          copies of logical line original text as the fLineText \n"
              "          attribute in the logical line objects. \n"
              "       feature_version, keyword only, is a (major, minor) tuple as \n"
-             "          ast.parse takes it: strings are read as that version of \n"
-             "          Python reads them, f-strings with nested fields from (3, 12), \n"
-             "          t-strings from (3, 14); by default as Python 3.10 does");
+             "          ast.parse takes it: code is read as that version of \n"
+             "          Python reads it, f-strings with nested fields from (3, 12), \n"
+             "          t-strings from (3, 14), lazy imports from (3, 15); by default \n"
+             "          as Python 3.10 does");
 PyObject* CreateLogicalLineParser(PyObject* module, PyObject* args, PyObject* kwargs) {
   static const char* keywords[] = {"copy_strings", "skip_whitespace_lines", "remove_comments",
                                    "include_line_text", "feature_version", nullptr};

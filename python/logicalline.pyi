@@ -161,8 +161,9 @@ class CreateHook(Protocol):
         /,
     ) -> object: ...
 
-# Strings are read as feature_version, a (3, minor) tuple, reads them: by default (None) as
-# Python 3.10, where logicalline-dump reads as the newest version the module knows. Pass
+# Code is read as feature_version, a (3, minor) tuple, reads it (strings from (3, 12), lazy
+# imports from (3, 15)): by default (None) as Python 3.10, where logicalline-dump reads as the
+# newest version the module knows, kNewestFeatureVersion. Pass
 # feature_version=sys.version_info[:2] to read as the running interpreter does.
 def CreateLogicalLineParser(
     copy_strings: object = True,
